@@ -1,0 +1,18 @@
+// Umbrella header: everything public in stbplat.
+#ifndef STBPLAT_STBPLAT_H
+#define STBPLAT_STBPLAT_H
+
+#include "stbplat/export.h"
+#include "stbplat/log.h"
+#include "stbplat/platform.h"
+
+// Byte streams and checksums
+#include "stbplat/crc.h"
+#include "stbplat/extruder.h"
+#include "stbplat/intruder.h"
+
+// Locations and package headers
+#include "stbplat/component_location.h"
+#include "stbplat/location.h"
+
+#endif

@@ -1,0 +1,6 @@
+# The shared library's exports are exactly the checked-in interface.
+add_test(NAME abi.exported_symbols
+  COMMAND ${PROJECT_SOURCE_DIR}/scripts/check-exports.sh $<TARGET_FILE:stbplat>
+          ${PROJECT_SOURCE_DIR}/tests/abi/exports ${CMAKE_NM})
+add_test(NAME abi.os_seam_discipline
+  COMMAND ${PROJECT_SOURCE_DIR}/scripts/check-seam.sh ${PROJECT_SOURCE_DIR})
