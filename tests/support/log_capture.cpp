@@ -14,6 +14,11 @@ std::vector<stbplat::test::LogMessage>& Store() {
 // Everything off unless a test turns it on.
 constexpr unsigned int kQuiet = 0;
 
+// Under AddressSanitizer the platform library registers its own array, which
+// resolves to this interposed one, and poisons the bytes behind it as its
+// redzone. Spare entries keep that redzone off the next variable.
+constexpr int kSpareForPlatformRedzone = 64;
+
 }  // namespace
 
 extern "C" {
@@ -23,7 +28,7 @@ extern "C" {
 #if defined(__clang__)
 __attribute__((no_sanitize("address")))
 #endif
-unsigned int subSystemLogLevel[eLogModuleCount] = {kQuiet};
+unsigned int subSystemLogLevel[eLogModuleCount + kSpareForPlatformRedzone] = {kQuiet};
 
 void GlobalLogUtilAdd(etLogUtilModuleId moduleId, unsigned int level, const char* sourceFile,
                       unsigned int line, const char* functionName, const char* format, ...) {
@@ -48,7 +53,7 @@ namespace test {
 
 LogCapture::LogCapture(unsigned int level) {
   std::memcpy(saved_, subSystemLogLevel, sizeof saved_);
-  for (unsigned int& l : subSystemLogLevel) l = level;
+  for (int i = 0; i < eLogModuleCount; ++i) subSystemLogLevel[i] = level;
   Store().clear();
 }
 
