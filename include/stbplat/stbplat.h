@@ -15,4 +15,10 @@
 #include "stbplat/component_location.h"
 #include "stbplat/location.h"
 
+// Utilities
+#include "stbplat/display_utils.h"
+#include "stbplat/ini_reader.h"
+#include "stbplat/string_checks.h"
+#include "stbplat/subsystem_init.h"
+
 #endif
