@@ -15,6 +15,9 @@
 #include "stbplat/component_location.h"
 #include "stbplat/location.h"
 
+// Disk probing
+#include "stbplat/disk.h"
+
 // Utilities
 #include "stbplat/display_utils.h"
 #include "stbplat/ini_reader.h"

@@ -4,6 +4,7 @@
 #include <cstring>
 #include <new>
 
+#include "os/scoped_file.h"
 #include "os/seam.h"
 #include "util/ini_core.h"
 
@@ -12,20 +13,6 @@ namespace {
 char* ReadLineThroughSeam(char* buffer, int size, void* context) {
   return stbplat::os::Sys().fgets(buffer, size, static_cast<FILE*>(context));
 }
-
-class ScopedFile {
- public:
-  explicit ScopedFile(FILE* file) : file_(file) {}
-  ~ScopedFile() {
-    if (file_ != nullptr) stbplat::os::Sys().fclose(file_);
-  }
-  ScopedFile(const ScopedFile&) = delete;
-  ScopedFile& operator=(const ScopedFile&) = delete;
-  FILE* get() const { return file_; }
-
- private:
-  FILE* file_;
-};
 
 }  // namespace
 
@@ -52,7 +39,8 @@ INIReader::~INIReader() {
 }
 
 int INIReader::Parse() {
-  ScopedFile file(fileName != nullptr ? stbplat::os::Sys().fopen64(fileName, "r") : nullptr);
+  stbplat::os::ScopedFile file(fileName != nullptr ? stbplat::os::Sys().fopen64(fileName, "r")
+                                                   : nullptr);
   if (file.get() == nullptr || lineBuffer == nullptr) {
     std::printf("Unable to open ini file %s\r\n", fileName != nullptr ? fileName : "(null)");
     return -1;
