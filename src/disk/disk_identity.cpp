@@ -41,7 +41,7 @@ constexpr size_t kAttrRaw2 = 7;
 constexpr size_t kAttrRaw4 = 9;
 constexpr unsigned int kSmartPollSeconds = 10;
 
-// Process-wide: callers have always been able to rely on it after a call.
+// One identity block for the whole process: GetVendorInfo is not re-entrant.
 unsigned char g_identity[kIdentitySize];
 
 // Copies a fixed-width identity field and terminates it.

@@ -63,15 +63,6 @@ TEST(INIReader, ErrorLinesAndMessagesNameTheFile) {
   EXPECT_EQ(r.entries.size(), 5u);
 }
 
-TEST(INIReader, RefusingHandlerMarksTheFirstRefusedLine) {
-  TempTextFile file("x=1\ny=2\nbad = 1\nz=3\nw=4\nv=5\nbad = 2\n");
-  IniRecorder r;
-  r.refusedNames = {"bad"};
-  INIReader reader(file.path().c_str(), IniRecorder::OnValue, &r);
-  EXPECT_EQ(reader.Parse(), 3);
-  EXPECT_EQ(r.entries.size(), 7u);
-}
-
 TEST(INIReader, DirectiveLinesAreSkippedUntilAHandlerIsSet) {
   TempTextFile file(":load extra\nk = v\n");
   IniRecorder r;
