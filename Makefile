@@ -1,6 +1,6 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build demo test check test-unit test-asan test-aarch64 clean
+.PHONY: all deps build demo test check test-unit test-asan test-aarch64 bench clean
 
 all: build
 
@@ -35,6 +35,10 @@ test-aarch64:
 
 # Everything CI runs.
 test: test-asan test-aarch64 test-unit
+
+# Benchmarks (host, -O2): library rates beside their baselines.
+bench:
+	@bench/run.sh
 
 clean:
 	rm -rf build
