@@ -1,6 +1,6 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build demo test check test-unit test-asan clean
+.PHONY: all deps build demo test check test-unit test-asan test-aarch64 bench clean
 
 all: build
 
@@ -26,8 +26,19 @@ test-asan: deps
 	cmake --build --preset asan
 	ctest --preset asan
 
+# The device build (AArch64 glibc), its unit tests under qemu-aarch64.
+test-aarch64:
+	@scripts/deps.sh build cross
+	cmake --preset aarch64 >/dev/null
+	cmake --build --preset aarch64
+	ctest --preset aarch64
+
 # Everything CI runs.
-test: test-asan test-unit
+test: test-asan test-aarch64 test-unit
+
+# Benchmarks (host, -O2): library rates beside their baselines.
+bench:
+	@bench/run.sh
 
 clean:
 	rm -rf build

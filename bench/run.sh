@@ -1,0 +1,12 @@
+#!/usr/bin/env bash
+# Builds the benchmarks (-O2, host), runs them once and prints each library
+# operation's rate beside its baseline's, with the ratio.
+#   bench/run.sh [google-benchmark options...]   e.g. --benchmark_filter=crc
+set -euo pipefail
+cd "$(dirname "$0")/.."
+scripts/deps.sh build
+cmake --preset bench >/dev/null
+cmake --build --preset bench >/dev/null
+out=build/bench/results.json
+build/bench/bench/stbplat_bench --benchmark_format=json "$@" >"$out"
+python3 bench/ratios.py "$out"
