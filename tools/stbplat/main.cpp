@@ -1,0 +1,62 @@
+// stbplat: inspect and change a set-top box's system records and storage.
+// Commands are grouped like git's: stbplat GROUP [COMMAND] [ARGS]; --help works
+// on every level. Exit codes: 0 done, 1 the operation failed, 2 bad usage.
+#include <CLI/CLI.hpp>
+
+#include <cstdio>
+#include <cstdlib>
+#include <exception>
+#include <string>
+
+#include "log_sink.h"
+#include "stbplat/log.h"
+#include "stbplat/stbplat.h"
+#include "tool.h"
+#include "actions.h"
+
+namespace stbtool {
+
+GlobalOptions& Options() {
+  static GlobalOptions options;
+  return options;
+}
+
+namespace {
+
+int Run(int argc, char** argv) {
+  CLI::App app{
+      "stbplat: set-top box system records and storage.\n"
+      "Reads and writes the device's records, flash and eMMC partitions; with --root DIR\n"
+      "(or STBPLAT_ROOT) on a device emulated from the files in DIR.",
+      "stbplat"};
+  app.set_help_all_flag("--help-all", "Show the help of every command");
+  app.require_subcommand(1);
+  app.fallthrough();
+  GlobalOptions& options = Options();
+  app.add_flag("--json", options.json, "Machine-readable output (JSON) where output is data");
+  app.add_flag("-v,--verbose", options.verbose,
+               "More library messages on standard error (repeat for more)");
+
+  RegisterDiskCommands(app);
+  RegisterUtilCommands(app);
+
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::CallForHelp& e) {
+    return app.exit(e);
+  } catch (const CLI::CallForAllHelp& e) {
+    return app.exit(e);
+  } catch (const CLI::ParseError& e) {
+    app.exit(e);
+    return kExitUsage;
+  }
+
+  if (options.verbose > 0) SetErrorLogLevel(eLogLevelError + static_cast<unsigned>(options.verbose));
+
+  return RunPendingAction();
+}
+
+}  // namespace
+}  // namespace stbtool
+
+int main(int argc, char** argv) { return stbtool::Run(argc, argv); }
