@@ -64,6 +64,13 @@ DisplayCapture::~DisplayCapture() {
   activeCapture = previous_;
 }
 
+QuietLog::QuietLog(etLogUtilModuleId module) : module_(module), savedLevel_(subSystemLogLevel[module]) {
+  ErrorLevel(module);
+  subSystemLogLevel[module] = 0;
+}
+
+QuietLog::~QuietLog() { subSystemLogLevel[module_] = savedLevel_; }
+
 std::string DisplayCapture::Text() const { return WithoutCarriageReturns(text_); }
 
 }  // namespace stbtool

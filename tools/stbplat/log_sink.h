@@ -36,6 +36,20 @@ class DisplayCapture {
                       const std::string& text, bool* taken);
 };
 
+// While alive, the module's messages are not produced at all (for calls
+// whose failure the tool expects and handles).
+class QuietLog {
+ public:
+  explicit QuietLog(etLogUtilModuleId module);
+  ~QuietLog();
+  QuietLog(const QuietLog&) = delete;
+  QuietLog& operator=(const QuietLog&) = delete;
+
+ private:
+  etLogUtilModuleId module_;
+  unsigned int savedLevel_;
+};
+
 }  // namespace stbtool
 
 #endif

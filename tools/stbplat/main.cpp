@@ -8,6 +8,7 @@
 #include <exception>
 #include <string>
 
+#include "hostsim/host_mode.h"
 #include "log_sink.h"
 #include "stbplat/log.h"
 #include "stbplat/stbplat.h"
@@ -34,6 +35,10 @@ int Run(int argc, char** argv) {
   app.fallthrough();
   GlobalOptions& options = Options();
   app.add_flag("--json", options.json, "Machine-readable output (JSON) where output is data");
+  app.add_option("--root", options.root,
+                 "Emulate the device from the files in DIR (host mode)")
+      ->envname("STBPLAT_ROOT")
+      ->type_name("DIR");
   app.add_flag("-v,--verbose", options.verbose,
                "More library messages on standard error (repeat for more)");
 
@@ -53,7 +58,16 @@ int Run(int argc, char** argv) {
 
   if (options.verbose > 0) SetErrorLogLevel(eLogLevelError + static_cast<unsigned>(options.verbose));
 
-  return RunPendingAction();
+  if (!options.root.empty()) {
+    std::string error;
+    if (!stbplat::hostsim::Attach(options.root, &error)) {
+      std::fprintf(stderr, "stbplat: --root %s: %s\n", options.root.c_str(), error.c_str());
+      return kExitUsage;
+    }
+  }
+  int code = RunPendingAction();
+  stbplat::hostsim::Detach();
+  return code;
 }
 
 }  // namespace
