@@ -7,6 +7,7 @@
 #include <cstdlib>
 #include <exception>
 #include <string>
+#include <vector>
 
 #include "hostsim/host_mode.h"
 #include "log_sink.h"
@@ -42,6 +43,7 @@ int Run(int argc, char** argv) {
   app.add_flag("-v,--verbose", options.verbose,
                "More library messages on standard error (repeat for more)");
 
+  RegisterChecksumCommands(app);
   RegisterDiskCommands(app);
   RegisterUtilCommands(app);
 
@@ -52,7 +54,16 @@ int Run(int argc, char** argv) {
   } catch (const CLI::CallForAllHelp& e) {
     return app.exit(e);
   } catch (const CLI::ParseError& e) {
-    app.exit(e);
+    // A word that is no command leaves the parser asking for one; say which.
+    std::vector<std::string> left = app.remaining(true);
+    if (!left.empty() && (dynamic_cast<const CLI::RequiredError*>(&e) != nullptr ||
+                          dynamic_cast<const CLI::ExtrasError*>(&e) != nullptr))
+      std::fprintf(stderr,
+                   "stbplat: unknown command or argument '%s'\n"
+                   "Run with --help for the commands and their arguments.\n",
+                   left.front().c_str());
+    else
+      app.exit(e);
     return kExitUsage;
   }
 

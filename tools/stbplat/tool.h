@@ -40,6 +40,7 @@ GlobalOptions& Options();
 
 // Each command group adds its subcommands to the top-level app.
 void RegisterDiskCommands(CLI::App& app);
+void RegisterChecksumCommands(CLI::App& app);
 void RegisterUtilCommands(CLI::App& app);
 
 }  // namespace stbtool
