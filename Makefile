@@ -5,7 +5,7 @@
 all: build
 
 deps:
-	@scripts/deps.sh build
+	@scripts/deps.sh build tools
 
 build: deps
 	cmake --preset default >/dev/null
