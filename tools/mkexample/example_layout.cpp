@@ -38,15 +38,17 @@ std::string KernelName(const Slot& s) {
 
 const std::vector<Slot>& Slots() {
   static const std::vector<Slot> slots = {
-      {Chip::kNor, "BOOT", "A", 0x00000, 64 * kKiB, 0},
-      {Chip::kNor, "FSBLINFO", "A", 0x10000, 64 * kKiB, 1},
-      {Chip::kNor, "BLDCFG", "A", 0x20000, 64 * kKiB, 2},
-      {Chip::kNor, "PANEL", "A", 0x30000, 64 * kKiB, 3},
-      {Chip::kNand, "PKGHDR", "A", 0x00000, 128 * kKiB, 4},
-      {Chip::kNand, "KERNEL", "A", 0x20000, 512 * kKiB, 5},
-      {Chip::kNand, "ROOTFS", "A", 0xA0000, 384 * kKiB, 6},
-      {Chip::kEmmc, "APPS", "A", 0x00000, 512 * kKiB, -1},
-      {Chip::kEmmc, "DATA", "A", 0x80000, 512 * kKiB, -1},
+      {Chip::kNor, "BOOT", "A", 0x00000, 64 * kKiB, 0, 0, 64 * kKiB},
+      {Chip::kNor, "FSBLINFO", "A", 0x10000, 64 * kKiB, 1, 0, 64 * kKiB},
+      {Chip::kNor, "BLDCFG", "A", 0x20000, 64 * kKiB, 2, 0, 64 * kKiB},
+      {Chip::kNor, "PANEL", "A", 0x30000, 64 * kKiB, 3, 0, 64 * kKiB},
+      {Chip::kNand, "PKGHDR", "A", 0x00000, 128 * kKiB, 4, 0, 128 * kKiB},
+      {Chip::kNand, "KERNEL", "A", 0x20000, 512 * kKiB, 5, 0, 512 * kKiB},
+      {Chip::kNand, "ROOTFS", "A", 0xA0000, 384 * kKiB, 6, 0, 384 * kKiB},
+      // The eMMC's slots are read at their offset in the partition as an
+      // offset in the whole device, so its one partition starts at 0.
+      {Chip::kEmmc, "APPS", "A", 0x00000, 512 * kKiB, -1, 0x00000, 1024 * kKiB},
+      {Chip::kEmmc, "APPS", "B", 0x80000, 512 * kKiB, -1, 0x80000, 1024 * kKiB},
   };
   return slots;
 }
@@ -68,11 +70,11 @@ Layout::Layout()
     nand[NandFileOffset(block * kNandBlock) + kNandPage] = kBadBlockMarker;
 }
 
-bool Layout::Place(const char* partition, uint64_t offset, const std::vector<unsigned char>& bytes,
-                   std::string* error) {
+bool Layout::Place(const char* partition, const char* slotName, uint64_t offset,
+                   const std::vector<unsigned char>& bytes, std::string* error) {
   const Slot* slot = nullptr;
   for (const Slot& s : Slots())
-    if (std::strcmp(s.partition, partition) == 0) slot = &s;
+    if (std::strcmp(s.partition, partition) == 0 && std::strcmp(s.slot, slotName) == 0) slot = &s;
   if (slot == nullptr || offset + bytes.size() > slot->size) {
     *error = std::string("no room for ") + std::to_string(bytes.size()) + " bytes in " + partition;
     return false;
@@ -152,22 +154,28 @@ std::vector<std::pair<std::string, std::string>> Layout::GeometryFiles() const {
 
 std::string Layout::MemoryMap() const {
   std::string text =
-      "; Memory map of the example device: its storage devices, their partitions\n"
-      "; and the slots in them, with offsets in the device.\n";
+      "; Memory map of the example device: its storage devices, the partitions in\n"
+      "; each (offsets in the device) and the slots in each partition (offsets in\n"
+      "; the partition), with the device node that holds each slot.\n";
   const Chip chips[] = {Chip::kNor, Chip::kNand, Chip::kEmmc};
   for (Chip chip : chips) {
-    text += std::string("\n[device ") + DeviceName(chip) + "]\n";
-    if (chip == Chip::kNor)
-      text += "technology = SPI_NOR.\nsize = 0x" + HexText(kNorSize, 5) + "\nphysical = 0x" +
-              HexText(kNorPhysicalBase, 8) + "\n";
-    else if (chip == Chip::kNand)
-      text += "technology = NAND....\nsize = 0x" + HexText(kNandSize, 6) + "\n";
-    else
-      text += "technology = EMMC....\nsize = 0x" + HexText(kEmmcSize, 6) + "\n";
+    const char* technology = chip == Chip::kNor ? "SPI_NOR." : chip == Chip::kNand ? "NAND...." : "EMMC....";
+    uint64_t base = chip == Chip::kNor ? kNorPhysicalBase : 0;
+    uint64_t size = chip == Chip::kNor ? kNorSize : chip == Chip::kNand ? kNandSize : kEmmcSize;
+    text += std::string("\n[device ") + DeviceName(chip) + "]\ntechnology = " + technology + "\nbase = 0x" +
+            HexText(base, 8) + "\nsize = 0x" + HexText(size, 6) + "\n";
+    std::string partition;
     for (const Slot& s : Slots()) {
       if (s.chip != chip) continue;
-      text += std::string("slot = ") + s.partition + "." + s.slot + " 0x" + HexText(s.offset, 5) + " 0x" +
-              HexText(s.size, 5) + "\n";
+      if (partition != s.partition) {
+        partition = s.partition;
+        uint64_t start = s.offset - s.partitionOffset;
+        text += std::string("\n[partition ") + DeviceName(chip) + "." + s.partition + "]\noffset = 0x" +
+                HexText(start, 6) + "\nsize = 0x" + HexText(s.partitionSize, 6) + "\n";
+      }
+      std::string node = s.mtd >= 0 ? "/dev/mtd" + std::to_string(s.mtd) : "/dev/mmca";
+      text += std::string("\n[slot ") + DeviceName(chip) + "." + s.partition + "." + s.slot + "]\noffset = 0x" +
+              HexText(s.partitionOffset, 6) + "\nsize = 0x" + HexText(s.size, 6) + "\nnode = " + node + "\n";
     }
   }
   return text;

@@ -32,6 +32,8 @@ struct Slot {
   uint64_t offset;  // in the chip
   uint64_t size;
   int mtd;          // -1 when the kernel has no MTD partition for it
+  uint64_t partitionOffset;  // of the slot in its partition
+  uint64_t partitionSize;
 };
 
 const std::vector<Slot>& Slots();
@@ -47,8 +49,8 @@ struct Layout {
 
   // Writes bytes into a slot at a logical offset; on NAND the offset counts
   // good blocks only, as the library reads them.
-  bool Place(const char* partition, uint64_t offset, const std::vector<unsigned char>& bytes,
-             std::string* error);
+  bool Place(const char* partition, const char* slot, uint64_t offset,
+             const std::vector<unsigned char>& bytes, std::string* error);
 
   std::string ProcMtd() const;
   std::string MemoryMap() const;

@@ -223,7 +223,9 @@ std::vector<unsigned char> ImageBody(const char* name, uint64_t size) {
 
 bool FillImages(Layout* layout, std::string* error) {
   std::vector<unsigned char> bytes;
-  auto place = [&](const char* partition, uint64_t offset) { return layout->Place(partition, offset, bytes, error); };
+  auto place = [&](const char* partition, uint64_t offset, const char* slot = "A") {
+    return layout->Place(partition, slot, offset, bytes, error);
+  };
 
   if (!Version(3, 2, 'c', "boot loader 3.2c", "FSBL", &bytes, error) || !place("BOOT", 0)) return false;
   if (!FsblInfo(&bytes, error) || !place("FSBLINFO", 0)) return false;
@@ -239,6 +241,7 @@ bool FillImages(Layout* layout, std::string* error) {
   if (!Version(2026, 11, 'b', "root file system 2026.11b", "MAIN", &bytes, error) || !place("ROOTFS", 0))
     return false;
   if (!Version(1, 4, 'a', "applications 1.4a", "APPS", &bytes, error) || !place("APPS", 0)) return false;
+  if (!Version(1, 3, 'c', "applications 1.3c", "APPS", &bytes, error) || !place("APPS", 0, "B")) return false;
   return true;
 }
 
