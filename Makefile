@@ -36,9 +36,11 @@ test-aarch64:
 # Everything CI runs.
 test: test-asan test-aarch64 test-unit
 
-# Benchmarks (host, -O2): library rates beside their baselines.
+# Benchmarks (host, -O2): library rates beside their baselines; then the
+# size of the stripped device library.
 bench:
 	@bench/run.sh
+	@bench/libsize.sh
 
 clean:
 	rm -rf build
