@@ -146,6 +146,7 @@ run_guest() {
   timeout 120 "$GUEST" "$1"
   rc=$?
   [ $rc -gt 1 ] && fail "$1" "guest program exited with status $rc"
+  return 0
 }
 
 . /etc/scenarios.sh

@@ -84,8 +84,28 @@ if want smoke.emmc; then
   scenario_end $s
 fi
 
+# ---- The kernel's MTD behaviour, no library code ------------------------------
+run_guest kernel.nand_semantics
+run_guest kernel.nor_semantics
+
 # ---- Disk probing on the emulated ATA disk --------------------------------------
 for s in disk.is_dev_hdd disk.blk_dev_size disk.vendor_info disk.vendor_type \
          disk.node_position disk.temperature; do
   run_guest $s
 done
+
+# ---- Flash faults ----------------------------------------------------------------------
+# DATA.A (mtd12) spans NAND blocks 96-127, pages of 2 KiB, 64 a block.
+# Faults: block 2 page 5 fails every write, block 6 fails every erase, block 8
+# page 10 reads back garbage (an uncorrectable ECC error).
+DATA_FIRST_BLOCK=96
+WEAK_PAGE=$(((DATA_FIRST_BLOCK + 2) * 64 + 5))
+WEAK_BLOCK=$((DATA_FIRST_BLOCK + 6))
+GRAVE_PAGE=$(((DATA_FIRST_BLOCK + 8) * 64 + 10))
+nand_faults() {
+  nand_load badblocks=$BAD_AT_LOAD weakpages=$WEAK_PAGE:0 weakblocks=$WEAK_BLOCK:0 \
+            gravepages=$GRAVE_PAGE:0
+}
+if want kernel.nand_faults; then
+  nand_faults && run_guest kernel.nand_faults || fail kernel.nand_faults "nandsim with faults"
+fi
