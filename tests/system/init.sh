@@ -76,7 +76,10 @@ LAYOUT="
 11|NAND simulator partition 2|flash1.ROOTFS.A
 12|NAND simulator partition 3|flash1.DATA.A
 13|NAND simulator partition 4|flash1.USER.A
+14|block:vda|EMMC0.APPS.A
 "
+# eMMC partitions share the table; on the box their nodes are block devices.
+EMMC_UNIT=0x80000
 NOR_PART_SIZE=0x80000
 
 real_mtd() {  # real_mtd <kernel name> -> N of the kernel's mtdN
@@ -92,6 +95,16 @@ make_table() {
   echo "dev:    size   erasesize  name" >/tmp/fake_mtd.new
   echo "$LAYOUT" | while IFS='|' read -r box kname bname; do
     [ -n "$box" ] || continue
+    case "$kname" in
+      block:*)
+        b=${kname#block:}
+        [ -e /sys/class/block/$b/dev ] || { echo "no block device $b"; continue; }
+        dev=$(cat /sys/class/block/$b/dev)
+        mknod /dev/mtd$box b "${dev%%:*}" "${dev##*:}"
+        printf 'mtd%d: %08x %08x "%s"\n' "$box" $(($(cat /sys/class/block/$b/size) * 512)) \
+          $((EMMC_UNIT)) "$bname" >>/tmp/fake_mtd.new
+        continue ;;
+    esac
     r=$(real_mtd "$kname") || { echo "no kernel MTD named '$kname'"; continue; }
     size=$(cat /sys/class/mtd/mtd$r/size)
     erase=$(cat /sys/class/mtd/mtd$r/erasesize)
@@ -104,7 +117,7 @@ make_table() {
 }
 
 setup_nor() {
-  load mtdram total_size=4096 erase_size=128 || return 1
+  load mtdram total_size=4096 erase_size=64 || return 1
   whole=$(real_mtd "mtdram test device") || return 1
   i=0
   for p in BOOT.A BOOT.B CFG.A CFG.B SPLASH.A SPLASH.B NVRAM.A NVRAM.B; do
@@ -130,13 +143,12 @@ mount --bind /tmp/fake_mtd /proc/mtd
 # Blocks bad from the factory: KERNEL.A block 2, KERNEL.B block 4,
 # ROOTFS.A block 8, DATA.A block 4.
 BAD_AT_LOAD=2,20,40,100
-nand_load badblocks=$BAD_AT_LOAD || fail setup "NAND simulator"
-mdev -s 2>/dev/null
 # Disk nodes appear asynchronously once the controllers probed.
 for _ in 1 2 3 4 5 6 7 8 9 10; do
   [ -e /realdev/sda ] && [ -e /realdev/vda ] && break
   sleep 1
 done
+nand_load badblocks=$BAD_AT_LOAD || fail setup "NAND simulator"
 cat /proc/mtd
 
 # ---- Scenarios --------------------------------------------------------------------

@@ -25,18 +25,20 @@ has() { grep -q -- "$1" "$2"; }
 # ---- Kernel and mtd-utils only: proves the plumbing ---------------------------
 if want smoke.mtd_table; then
   s=smoke.mtd_table
-  check $s "table has 14 partitions" test "$(grep -c '^mtd' /proc/mtd)" -eq 14
+  check $s "table has 15 partitions" test "$(grep -c '^mtd' /proc/mtd)" -eq 15
+  check $s "eMMC row" has 'mtd14: 04000000 00080000 "EMMC0.APPS.A"' /proc/mtd
+  check $s "eMMC node" test -b /dev/mtd14
   check $s "KERNEL.A row" has 'mtd9: 00200000 00020000 "flash1.KERNEL.A"' /proc/mtd
   check $s "ROOTFS.A row" has 'mtd11: 00800000 00020000 "flash1.ROOTFS.A"' /proc/mtd
-  check $s "NOR chip row" has 'mtd8: 00400000 00020000 "flash0"' /proc/mtd
-  check $s "NOR partition row" has 'mtd0: 00080000 00020000 "flash0.BOOT.A"' /proc/mtd
+  check $s "NOR chip row" has 'mtd8: 00400000 00010000 "flash0"' /proc/mtd
+  check $s "NOR partition row" has 'mtd0: 00080000 00010000 "flash0.BOOT.A"' /proc/mtd
   mtdinfo /dev/mtd11 >/tmp/mi 2>&1; cat /tmp/mi
   check $s "mtdinfo type" has 'Type:.*nand' /tmp/mi
   check $s "mtdinfo erase block" has 'Eraseblock size:.*131072 bytes' /tmp/mi
   check $s "mtdinfo page" has 'Minimum input/output unit size:.*2048 bytes' /tmp/mi
   check $s "mtdinfo blocks" has 'Amount of eraseblocks: *64 (8388608 bytes' /tmp/mi
   mtdinfo /dev/mtd8 >/tmp/mi 2>&1
-  check $s "mtdinfo NOR chip size" has 'Amount of eraseblocks: *32 (4194304 bytes' /tmp/mi
+  check $s "mtdinfo NOR chip size" has 'Amount of eraseblocks: *64 (4194304 bytes' /tmp/mi
   scenario_end $s
 fi
 

@@ -16,6 +16,8 @@ constexpr std::size_t kPage = 2048;
 constexpr std::uint64_t kDataSize = 32 * kBlock;  // DATA.A, block 4 bad at load
 constexpr std::uint64_t kNorChip = 0x400000;
 constexpr std::uint64_t kNorPart = 0x80000;
+// mtdram is loaded with 64 KiB sectors, unlike the NAND blocks.
+constexpr std::uint64_t kNorSector = 0x10000;
 
 std::string Outcome(long rc, int err) {
   return rc < 0 ? std::string("-1 ") + std::strerror(err) : std::to_string(rc);
@@ -131,7 +133,7 @@ SCENARIO("kernel.nor_semantics") {
   REQUIRE(chip.ok());
   CHECK_EQ(static_cast<int>(chip.info().type), MTD_RAM);
   CHECK_EQ(chip.info().size, static_cast<__u32>(kNorChip));
-  CHECK_EQ(chip.info().erasesize, static_cast<__u32>(kBlock));
+  CHECK_EQ(chip.info().erasesize, static_cast<__u32>(kNorSector));
   systest::Info("kernel: NOR (mtdram) writesize " + std::to_string(chip.info().writesize));
   CHECK_EQ(chip.Erase(0, kNorChip), 0);
   CHECK_BYTES(chip.ReadAll(0, 4096), systest::Erased(4096));
@@ -145,11 +147,11 @@ SCENARIO("kernel.nor_semantics") {
 
   // Unaligned and oversized erase regions.
   errno = 0;
-  int rc = chip.Erase(16, kBlock);
+  int rc = chip.Erase(16, kNorSector);
   systest::Info("kernel: NOR unaligned erase -> " + Outcome(rc, errno));
   CHECK_EQ(rc, -1);
   errno = 0;
-  rc = chip.Erase(kNorChip - kBlock, 2 * kBlock);
+  rc = chip.Erase(kNorChip - kNorSector, 2 * kNorSector);
   systest::Info("kernel: NOR erase past the end -> " + Outcome(rc, errno));
   CHECK_EQ(rc, -1);
 
