@@ -92,7 +92,7 @@ run_guest kernel.nor_semantics
 
 # ---- Disk probing on the emulated ATA disk --------------------------------------
 for s in disk.is_dev_hdd disk.blk_dev_size disk.vendor_info disk.vendor_type \
-         disk.node_position disk.temperature; do
+         disk.node_position disk.temperature disk.smart_loop; do
   run_guest $s
 done
 
