@@ -11,6 +11,17 @@
 #include "stbplat/extruder.h"
 #include "stbplat/intruder.h"
 
+// System descriptor records
+#include "stbplat/bseck_reload.h"
+#include "stbplat/build_config.h"
+#include "stbplat/data_entry.h"
+#include "stbplat/descriptor_status.h"
+#include "stbplat/front_panel.h"
+#include "stbplat/fsbl_info.h"
+#include "stbplat/memory_config.h"
+#include "stbplat/system_descriptor.h"
+#include "stbplat/version_entry.h"
+
 // Locations and package headers
 #include "stbplat/component_location.h"
 #include "stbplat/location.h"

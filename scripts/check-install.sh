@@ -1,0 +1,24 @@
+#!/usr/bin/env bash
+# Installs the build into a scratch prefix and builds a program outside the
+# tree against it twice: with find_package(stbplat) and with pkg-config.
+#   check-install.sh BUILD_DIR SOURCE_DIR
+set -euo pipefail
+build=$(cd "$1" && pwd)
+src=$(cd "$2" && pwd)
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+prefix=$work/prefix
+cmake --install "$build" --prefix "$prefix" >/dev/null
+consumer=$src/tests/install/consumer
+
+cmake -S "$consumer" -B "$work/cmake-build" -G Ninja -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
+cmake --build "$work/cmake-build" >/dev/null
+LD_LIBRARY_PATH=$prefix/lib "$work/cmake-build/consumer"
+
+libdir=$(ls -d "$prefix"/lib*/pkgconfig | head -n 1)
+export PKG_CONFIG_PATH=$libdir
+# shellcheck disable=SC2046
+g++ -std=c++17 "$consumer/main.cpp" -o "$work/pc-consumer" $(pkg-config --cflags --libs stbplat) \
+  -Wl,-rpath,"$(dirname "$libdir")"
+"$work/pc-consumer"
+echo "check-install: find_package and pkg-config consumers built and ran"
