@@ -1,11 +1,11 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build demo test check test-unit test-asan test-aarch64 bench clean
+.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-fuzz bench clean
 
 all: build
 
 deps:
-	@scripts/deps.sh build
+	@scripts/deps.sh build tools
 
 build: deps
 	cmake --preset default >/dev/null
@@ -33,8 +33,13 @@ test-aarch64:
 	cmake --build --preset aarch64
 	ctest --preset aarch64
 
+# Each record reader under libFuzzer (ASan + UBSan) for a bounded time.
+FUZZ_SECONDS ?= 20
+test-fuzz: deps
+	scripts/run-fuzz.sh $(FUZZ_SECONDS)
+
 # Everything CI runs.
-test: test-asan test-aarch64 test-unit
+test: test-fuzz test-asan test-aarch64 test-unit
 
 # Benchmarks (host, -O2): library rates beside their baselines.
 bench:
