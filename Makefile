@@ -1,11 +1,11 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-system bench clean
+.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-fuzz test-system bench clean
 
 all: build
 
 deps:
-	@scripts/deps.sh build
+	@scripts/deps.sh build tools
 
 build: deps
 	cmake --preset default >/dev/null
@@ -33,6 +33,11 @@ test-aarch64:
 	cmake --build --preset aarch64
 	ctest --preset aarch64
 
+# Each record reader under libFuzzer (ASan + UBSan) for a bounded time.
+FUZZ_SECONDS ?= 20
+test-fuzz: deps
+	scripts/run-fuzz.sh $(FUZZ_SECONDS)
+
 # System tests: the library on a real kernel in a virtual machine (flash
 # simulators, an ATA disk, /dev/mem). Ends with its "N passed, N failed" line.
 test-system:
@@ -40,7 +45,7 @@ test-system:
 
 # Everything CI runs; the system tests come last so that their summary line
 # closes the output.
-test: test-asan test-aarch64 test-unit test-system
+test: test-fuzz test-asan test-aarch64 test-unit test-system
 
 # Benchmarks (host, -O2): library rates beside their baselines.
 bench:

@@ -12,7 +12,12 @@
 // - Assigning from an in-place entry whose source is not a memory stream
 //   copies the bytes through the source stream (its position is restored),
 //   since the payload pointer is then only an offset.
-// - DisplayAsText never reads past length bytes.
+// - DisplayAsText never reads past length bytes (nor before the payload
+//   when it starts with a zero) and leaves the payload unchanged.
+// - operator== and DisplayAsText reach an offset-only payload through its
+//   source stream, never through the offset as an address.
+// - GetInPlaceData without a source stream, or whose source cannot be
+//   positioned at the payload, returns false.
 // - Allocation failures are reported ("Memory allocation failure"), never
 //   thrown.
 #ifndef STBPLAT_DATA_ENTRY_H

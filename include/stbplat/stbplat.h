@@ -23,6 +23,7 @@
 #include "stbplat/version_entry.h"
 
 // Locations and package headers
+#include "stbplat/code_object_info.h"
 #include "stbplat/component_location.h"
 #include "stbplat/location.h"
 

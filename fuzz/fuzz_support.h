@@ -1,0 +1,64 @@
+// Shared pieces of the fuzz targets: a log sink that formats every message
+// (so a bad format argument is caught) and throws the text away, and the
+// round-trip property every target checks.
+#ifndef STBPLAT_FUZZ_FUZZ_SUPPORT_H
+#define STBPLAT_FUZZ_FUZZ_SUPPORT_H
+
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <vector>
+
+#include "stbplat/stbplat.h"
+
+namespace stbplat {
+namespace fuzz {
+
+// Big enough for any record a fuzz input can describe; records that need
+// more fail to store, which the property treats as "cannot be stored".
+constexpr unsigned int kStoreBufferSize = 1u << 16;
+
+// Stores `record` with `store(record, intruder)` into a fresh buffer; returns
+// false when the store fails.
+template <typename StoreFn>
+bool StoreToBytes(StoreFn store, std::vector<unsigned char>* out) {
+  out->assign(kStoreBufferSize, 0);
+  Intruder intruder(out->data(), kStoreBufferSize);
+  if (store(intruder) != 0) return false;
+  out->resize(static_cast<size_t>(intruder.pCurrent - intruder.pStart));
+  return true;
+}
+
+// What reads successfully and can be stored must store, read back and store
+// again to the same bytes.
+template <typename Record, typename ReadFn, typename StoreFn>
+void CheckRoundTrip(const Record& first, ReadFn read, StoreFn store) {
+  std::vector<unsigned char> once;
+  if (!StoreToBytes([&](Intruder& out) { return store(first, out); }, &once)) return;
+  Record second;
+  Extruder in(once.data(), static_cast<unsigned int>(once.size()));
+  if (read(second, in) != 0) std::abort();
+  std::vector<unsigned char> twice;
+  if (!StoreToBytes([&](Intruder& out) { return store(second, out); }, &twice)) std::abort();
+  if (once != twice) std::abort();
+}
+
+}  // namespace fuzz
+}  // namespace stbplat
+
+// One fuzz target: reads a Record from the input with READ (an expression of
+// `r` and `from`); on success checks the round trip, storing with STORE (an
+// expression of `r` and `to`).
+#define STBPLAT_FUZZ_RECORD(Record, READ, STORE)                                         \
+  extern "C" int LLVMFuzzerTestOneInput(const unsigned char* data, size_t size) {        \
+    if (size > 0xFFFFFFFFu) return 0;                                                   \
+    Extruder in(data, static_cast<unsigned int>(size));                                  \
+    Record record;                                                                       \
+    auto read = [](Record& r, Extruder& from) { return READ; };                          \
+    auto store = [](const Record& r, Intruder& to) { return STORE; };                    \
+    if (read(record, in) == 0) ::stbplat::fuzz::CheckRoundTrip(record, read, store);      \
+    return 0;                                                                            \
+  }
+
+#endif

@@ -1,0 +1,34 @@
+#!/usr/bin/env bash
+# Builds the fuzz targets and runs each for a bounded time on seeds that the
+# library itself stores. Any crash, overread, leak, timeout or broken round
+# trip fails the run.
+#   run-fuzz.sh [SECONDS_PER_TARGET]   (default 20)
+set -euo pipefail
+cd "$(dirname "$0")/.."
+seconds=${1:-20}
+cmake --preset fuzz >/dev/null
+cmake --build --preset fuzz
+build=build/fuzz
+seeds=$build/seeds
+rm -rf "$seeds" && mkdir -p "$seeds"
+"$build/fuzz/fuzz_make_seeds" "$seeds"
+
+passed=0 failed=0
+for target in "$build"/fuzz/*_fuzz; do
+  name=$(basename "$target")
+  corpus=$build/corpus/$name
+  mkdir -p "$corpus" "$build/findings/$name"
+  log=$build/$name.log
+  if "$target" -max_total_time="$seconds" -timeout=5 -rss_limit_mb=2048 -print_final_stats=1 \
+       -artifact_prefix="$build/findings/$name/" "$corpus" "$seeds/$name" >"$log" 2>&1; then
+    stats=$(grep -E '^stat::number_of_executed_units|^#[0-9]+ *DONE' "$log" | tail -n 1)
+    echo "fuzz $name: ok ($stats)"
+    passed=$((passed + 1))
+  else
+    echo "fuzz $name: FAILED, see $log and $build/findings/$name/" >&2
+    grep -E 'ERROR|SUMMARY|==[0-9]+==' "$log" | head -n 20 >&2 || true
+    failed=$((failed + 1))
+  fi
+done
+echo "fuzz: $passed passed, $failed failed"
+[ "$failed" -eq 0 ]

@@ -1,0 +1,120 @@
+// Helpers for the record tests: golden files, written bytes, record
+// messages, and a memory stream that answers as a 64-bit device stream.
+#ifndef STBPLAT_TESTS_DESCRIPTORS_RECORD_TEST_UTIL_H
+#define STBPLAT_TESTS_DESCRIPTORS_RECORD_TEST_UTIL_H
+
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <vector>
+
+#include "stbplat/extruder.h"
+#include "stbplat/intruder.h"
+#include "support/log_capture.h"
+
+namespace records_test {
+
+using Bytes = std::vector<unsigned char>;
+
+inline Bytes Golden(const std::string& name) {
+  std::ifstream file(std::string(STBPLAT_TEST_DATA_DIR) + "/" + name, std::ios::binary);
+  return Bytes(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
+}
+
+inline Bytes Written(const Intruder& out) {
+  return Bytes(out.pStart, out.pStart + (out.pCurrent - out.pStart));
+}
+
+inline unsigned long Offset(const Extruder& in) {
+  return static_cast<unsigned long>(in.pCurrent - in.pStart);
+}
+
+// Texts of the record messages (module 3) only, in order.
+inline std::vector<std::string> RecordTexts(const stbplat::test::LogCapture& capture) {
+  std::vector<std::string> texts;
+  for (const auto& m : capture.messages())
+    if (m.module == eLogModuleRecords) texts.push_back(m.text);
+  return texts;
+}
+
+inline void Append(Bytes& bytes, const Bytes& more) {
+  bytes.insert(bytes.end(), more.begin(), more.end());
+}
+
+inline void PutU32(Bytes& bytes, unsigned int v) {
+  for (int shift = 24; shift >= 0; shift -= 8) bytes.push_back(static_cast<unsigned char>(v >> shift));
+}
+
+inline void PutU16(Bytes& bytes, unsigned int v) {
+  bytes.push_back(static_cast<unsigned char>(v >> 8));
+  bytes.push_back(static_cast<unsigned char>(v));
+}
+
+inline void PutType(Bytes& bytes, const char* four) {
+  for (int i = 0; i < 4; ++i) bytes.push_back(static_cast<unsigned char>(four[i]));
+}
+
+// type | size | flags | major | minor | payload
+inline Bytes Entry(const char* type, const Bytes& payload, unsigned char major = 0,
+                   unsigned char minor = 0, unsigned short flags = 0) {
+  Bytes bytes;
+  PutType(bytes, type);
+  PutU32(bytes, static_cast<unsigned int>(4 + payload.size()));
+  PutU16(bytes, flags);
+  bytes.push_back(major);
+  bytes.push_back(minor);
+  Append(bytes, payload);
+  return bytes;
+}
+
+inline Bytes Data(const std::string& text) {
+  Bytes bytes;
+  PutType(bytes, "DATA");
+  PutU32(bytes, static_cast<unsigned int>(text.size()));
+  bytes.insert(bytes.end(), text.begin(), text.end());
+  return bytes;
+}
+
+// A memory stream that reports 64-bit positions: getP64/setP64 map onto
+// the buffer offset, so that the records' 64-bit paths can be driven and
+// observed without a device.
+class Memory64Extruder : public Extruder {
+ public:
+  Memory64Extruder(const unsigned char* buffer, unsigned int size) : Extruder(buffer, size) {
+    is64Address = true;
+  }
+  unsigned long getP64() override {
+    ++getP64Calls;
+    return static_cast<unsigned long>(pCurrent - pStart);
+  }
+  bool setP64(unsigned long offset) override {
+    ++setP64Calls;
+    if (offset > length) return false;
+    return setP(const_cast<unsigned char*>(pStart) + offset);
+  }
+  int getP64Calls = 0;
+  int setP64Calls = 0;
+};
+
+// The writing twin of Memory64Extruder.
+class Memory64Intruder : public Intruder {
+ public:
+  Memory64Intruder(unsigned char* buffer, unsigned int size) : Intruder(buffer, size) {
+    is64Address = true;
+  }
+  unsigned long getP64() override {
+    ++getP64Calls;
+    return static_cast<unsigned long>(pCurrent - pStart);
+  }
+  bool setP64(unsigned long offset) override {
+    ++setP64Calls;
+    if (offset > length) return false;
+    return setP(const_cast<unsigned char*>(pStart) + offset);
+  }
+  int getP64Calls = 0;
+  int setP64Calls = 0;
+};
+
+}  // namespace records_test
+
+#endif

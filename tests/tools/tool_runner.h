@@ -1,0 +1,27 @@
+// Runs the stbplat executable the way a user does and collects what it
+// printed and its exit code.
+#ifndef STBPLAT_TESTS_TOOLS_TOOL_RUNNER_H
+#define STBPLAT_TESTS_TOOLS_TOOL_RUNNER_H
+
+#include <string>
+#include <vector>
+
+namespace stbplat {
+namespace test {
+
+struct ToolRun {
+  int exitCode = -1;
+  std::string out;
+  std::string err;
+};
+
+// args are passed as they are (no shell); input, when given, is the
+// program's standard input. STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared
+// unless env sets them ("NAME=value" entries).
+ToolRun RunTool(const std::vector<std::string>& args, const std::string& input = "",
+                const std::vector<std::string>& env = {});
+
+}  // namespace test
+}  // namespace stbplat
+
+#endif

@@ -1,0 +1,29 @@
+// Host mode: runs the library against a device emulated from files.
+//
+// A device root holds
+//   memory-map.ini          the platform memory map (devices, partitions, slots)
+//   proc/mtd                the kernel's partition table, as on the device
+//   dev/mtdN                one image per MTD partition
+//   dev/mtdN.ini            its geometry: type (nor, nand, emmc), erase and
+//                           page size, OOB size, bad blocks
+//   dev/mmca                the whole eMMC device
+// While attached, the library's device and file calls for /proc/mtd and
+// /dev/... are answered from these files; every other path is passed on.
+#ifndef STBPLAT_HOSTSIM_HOST_MODE_H
+#define STBPLAT_HOSTSIM_HOST_MODE_H
+
+#include <string>
+
+namespace stbplat {
+namespace hostsim {
+
+// Binds the device under root. On failure returns false and says why.
+bool Attach(const std::string& root, std::string* error);
+// Unbinds it (flushing what the images need); harmless when not attached.
+void Detach();
+bool IsAttached();
+
+}  // namespace hostsim
+}  // namespace stbplat
+
+#endif

@@ -1,0 +1,55 @@
+// The tool's end of the library's logging: the tool defines the log call
+// itself, so library messages reach it directly. Errors and traces go to
+// standard error; display output (level 4) that a DisplayCapture asked for
+// is collected instead, which is how records that only know how to display
+// themselves through the log are shown.
+#ifndef STBPLAT_TOOL_LOG_SINK_H
+#define STBPLAT_TOOL_LOG_SINK_H
+
+#include <string>
+
+#include "stbplat/log.h"
+
+namespace stbtool {
+
+// Sets the level of every module for messages on standard error.
+void SetErrorLogLevel(unsigned int level);
+
+// While alive, the module's display lines are collected (the module's level is
+// raised to display for that time) and not printed.
+class DisplayCapture {
+ public:
+  explicit DisplayCapture(etLogUtilModuleId module);
+  ~DisplayCapture();
+  DisplayCapture(const DisplayCapture&) = delete;
+  DisplayCapture& operator=(const DisplayCapture&) = delete;
+
+  // The collected text with "\r\n" line ends turned into "\n".
+  std::string Text() const;
+
+ private:
+  etLogUtilModuleId module_;
+  unsigned int savedLevel_;
+  DisplayCapture* previous_;
+  std::string text_;
+  friend void Collect(DisplayCapture* capture, etLogUtilModuleId module, unsigned int level,
+                      const std::string& text, bool* taken);
+};
+
+// While alive, the module's messages are not produced at all (for calls
+// whose failure the tool expects and handles).
+class QuietLog {
+ public:
+  explicit QuietLog(etLogUtilModuleId module);
+  ~QuietLog();
+  QuietLog(const QuietLog&) = delete;
+  QuietLog& operator=(const QuietLog&) = delete;
+
+ private:
+  etLogUtilModuleId module_;
+  unsigned int savedLevel_;
+};
+
+}  // namespace stbtool
+
+#endif

@@ -1,0 +1,87 @@
+// stbplat: inspect and change a set-top box's system records and storage.
+// Commands are grouped like git's: stbplat GROUP [COMMAND] [ARGS]; --help works
+// on every level. Exit codes: 0 done, 1 the operation failed, 2 bad usage.
+#include <CLI/CLI.hpp>
+
+#include <cstdio>
+#include <cstdlib>
+#include <exception>
+#include <string>
+#include <vector>
+
+#include "hostsim/host_mode.h"
+#include "log_sink.h"
+#include "stbplat/log.h"
+#include "stbplat/stbplat.h"
+#include "tool.h"
+#include "actions.h"
+
+namespace stbtool {
+
+GlobalOptions& Options() {
+  static GlobalOptions options;
+  return options;
+}
+
+namespace {
+
+int Run(int argc, char** argv) {
+  CLI::App app{
+      "stbplat: set-top box system records and storage.\n"
+      "Reads and writes the device's records, flash and eMMC partitions; with --root DIR\n"
+      "(or STBPLAT_ROOT) on a device emulated from the files in DIR.",
+      "stbplat"};
+  app.set_help_all_flag("--help-all", "Show the help of every command");
+  app.require_subcommand(1);
+  app.fallthrough();
+  GlobalOptions& options = Options();
+  app.add_flag("--json", options.json, "Machine-readable output (JSON) where output is data");
+  app.add_option("--root", options.root,
+                 "Emulate the device from the files in DIR (host mode)")
+      ->envname("STBPLAT_ROOT")
+      ->type_name("DIR");
+  app.add_flag("-v,--verbose", options.verbose,
+               "More library messages on standard error (repeat for more)");
+
+  RegisterChecksumCommands(app);
+  RegisterDiskCommands(app);
+  RegisterUtilCommands(app);
+
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::CallForHelp& e) {
+    return app.exit(e);
+  } catch (const CLI::CallForAllHelp& e) {
+    return app.exit(e);
+  } catch (const CLI::ParseError& e) {
+    // A word that is no command leaves the parser asking for one; say which.
+    std::vector<std::string> left = app.remaining(true);
+    if (!left.empty() && (dynamic_cast<const CLI::RequiredError*>(&e) != nullptr ||
+                          dynamic_cast<const CLI::ExtrasError*>(&e) != nullptr))
+      std::fprintf(stderr,
+                   "stbplat: unknown command or argument '%s'\n"
+                   "Run with --help for the commands and their arguments.\n",
+                   left.front().c_str());
+    else
+      app.exit(e);
+    return kExitUsage;
+  }
+
+  if (options.verbose > 0) SetErrorLogLevel(eLogLevelError + static_cast<unsigned>(options.verbose));
+
+  if (!options.root.empty()) {
+    std::string error;
+    if (!stbplat::hostsim::Attach(options.root, &error)) {
+      std::fprintf(stderr, "stbplat: --root %s: %s\n", options.root.c_str(), error.c_str());
+      return kExitUsage;
+    }
+  }
+  int code = RunPendingAction();
+  stbplat::hostsim::Detach();
+  return code;
+}
+
+}  // namespace
+}  // namespace stbtool
+
+int main(int argc, char** argv) { return stbtool::Run(argc, argv); }
