@@ -340,8 +340,22 @@ std::string TreeText(const Json& tree, int indent) {
       text << pad << key << ": " << scalar(value) << "\n";
     }
   };
+  // The common header of a record reads best on one line.
+  bool header = tree.is_object() && tree.contains("majorVer") && tree.contains("type") && tree.contains("valid");
+  if (header) {
+    char versions[64];
+    std::snprintf(versions, sizeof versions, "version %u.%u, flags 0x%04X", tree["majorVer"].get<unsigned>(),
+                  tree["minorVer"].get<unsigned>(), tree["flags"].get<unsigned>());
+    text << pad << "type: " << tree["type"].get<std::string>() << " (" << versions
+         << (tree["valid"].get<bool>() ? "" : ", not read") << ")\n";
+  }
   if (tree.is_object()) {
-    for (auto it = tree.begin(); it != tree.end(); ++it) element(it.key(), it.value());
+    for (auto it = tree.begin(); it != tree.end(); ++it) {
+      if (header && (it.key() == "type" || it.key() == "flags" || it.key() == "majorVer" ||
+                     it.key() == "minorVer" || it.key() == "valid"))
+        continue;
+      element(it.key(), it.value());
+    }
   } else if (tree.is_array()) {
     size_t i = 0;
     for (const Json& item : tree) element("[" + std::to_string(i++) + "]", item);
