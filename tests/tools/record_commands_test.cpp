@@ -82,6 +82,15 @@ TEST(RecordShow, ReadsStandardInput) {
   EXPECT_NE(std::string::npos, run.out.find("text: \"READY\"")) << run.out;
 }
 
+TEST(RecordShow, ErasedFlashHoldsNoRecord) {
+  // The NOR image's last sector past the front-panel record is erased.
+  ToolRun run = RunTool({"record", "show", kNorImage, "--at", "0x3F000"});
+  EXPECT_EQ(1, run.exitCode);
+  EXPECT_NE(std::string::npos, run.err.find("at 0x3F000 is erased")) << run.err;
+  ToolRun check = RunTool({"record", "check", kNorImage, "--at", "0x3F000"});
+  EXPECT_EQ(1, check.exitCode);
+}
+
 TEST(RecordShow, BadSourceAndTypeAreUsageErrors) {
   ToolRun missing = RunTool({"record", "show", "no/such/file"});
   EXPECT_EQ(2, missing.exitCode);

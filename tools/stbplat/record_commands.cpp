@@ -47,6 +47,18 @@ std::vector<std::string> Lines(const std::string& text) {
   return lines;
 }
 
+constexpr unsigned char kErasedByte = 0xFF;
+constexpr size_t kErasedProbe = 4;
+
+// Erased flash reads as 0xFF; without a type given, nothing is stored there.
+void RefuseErased(const RecordSource& source, RecordKind wanted, const std::string& command) {
+  if (wanted != RecordKind::kUnknown || source.bytes.size() < kErasedProbe) return;
+  for (size_t i = 0; i < kErasedProbe; ++i)
+    if (source.bytes[i] != kErasedByte) return;
+  throw Failure(command + ": " + source.label + " at " + Hex(source.base) +
+                " is erased (0xFF bytes): no record there");
+}
+
 struct ShowArgs {
   std::string source;
   std::string type;
@@ -57,6 +69,7 @@ struct ShowArgs {
 void RunShow(const ShowArgs& args) {
   RecordKind wanted = KindOption(args.type);
   RecordSource source = LoadRecordSource(args.source, args.at);
+  RefuseErased(source, wanted, "record show");
   DecodedRecord record = DecodeRecord(source.bytes, wanted);
   const RecordKindInfo& info = KindInfo(record.kind);
   if (Options().json) {
@@ -86,6 +99,7 @@ struct CheckArgs {
 void RunCheck(const CheckArgs& args) {
   RecordKind wanted = KindOption(args.type);
   RecordSource source = LoadRecordSource(args.source, args.at);
+  RefuseErased(source, wanted, "record check");
   CheckResult result = CheckRecord(source.bytes.data(), source.bytes.size(), source.base, wanted);
   const RecordKindInfo& info = KindInfo(result.kind);
   if (Options().json) {
