@@ -99,6 +99,9 @@ for m in $modules; do
   echo "$m:$files" >>"$rootfs/etc/moddeps"
 done
 
+# The box's memory map (devices, partitions, slots) for the platform
+# library, matching the partition table init.sh presents.
+[ -f "$here/memory-map.ini" ] && cp "$here/memory-map.ini" "$rootfs/etc/memory-map.ini"
 cp "$here/init.sh" "$rootfs/init"
 cp "$here/scenarios.sh" "$rootfs/etc/scenarios.sh"
 chmod +x "$rootfs/init"
