@@ -145,6 +145,17 @@ SCENARIO("kernel.nand_semantics") {
   errno = 0;
   rc = dev.MarkBad(6 * kBlock);
   systest::Info("kernel: NAND marking a bad block again -> " + Outcome(rc, errno));
+  // Writing into a bad block: the MTD layer does not look at the bad-block
+  // table on writes.
+  errno = 0;
+  rc = dev.Write(6 * kBlock + kPage, systest::Pattern(kPage, 8));
+  err = errno;
+  auto inBad = dev.ReadAll(6 * kBlock + kPage, kPage);
+  systest::Info("kernel: NAND write into a block marked bad -> " + Outcome(rc, err) + ", reads " +
+                (inBad == systest::Pattern(kPage, 8) ? "the data" : "other bytes"));
+  errno = 0;
+  rc = dev.Write(4 * kBlock + kPage, systest::Pattern(kPage, 9));
+  systest::Info("kernel: NAND write into a factory-bad block -> " + Outcome(rc, errno));
 
   std::string bad_list;
   for (auto b : dev.BadBlocks()) bad_list += " " + std::to_string(b);
