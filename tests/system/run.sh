@@ -68,9 +68,17 @@ cp /bin/busybox "$rootfs/bin/busybox"
 for tool in nanddump nandwrite flash_erase mtdinfo mtdpart hdparm smartctl; do
   put_program "$(command -v "$tool")"
 done
-put_program "$guest_bin"
-mkdir -p "$rootfs/opt/stbplat"
-ln -sf "$guest_bin" "$rootfs/opt/stbplat/systest"
+# The guest program and the project's libraries go to /opt/stbplat (the
+# build tree may lie under /tmp, which the guest mounts over).
+mkdir -p "$rootfs/opt/stbplat/lib"
+cp "$guest_bin" "$rootfs/opt/stbplat/systest"
+ldd "$guest_bin" | awk '/=> \//{print $3} /^[ \t]*\/.*ld-linux/{print $1}' |
+  while read -r lib; do
+    case "$lib" in
+      "$build"/*) cp -L "$lib" "$rootfs/opt/stbplat/lib/$(basename "$lib")" ;;
+      *) put "$lib" ;;
+    esac
+  done
 
 # smartctl's drive database: the packaged one, plus a local entry for the
 # emulated disk's model (see init.sh for why).
