@@ -452,6 +452,12 @@ SCENARIO("flash.erase_slots") {
   Location nandB = Loc("NAND0", "KERNEL", "B");
   CHECK(flash->EraseSlot(&nandB));
   CHECK_BYTES(GoodBlocks(kernelB), systest::Erased(15 * kBlock));
+  // EraseSector on NAND: block 0 only.
+  CHECK(NANDWriteLoc(data.data(), 2 * kBlock, &nandB, 0));
+  CHECK(flash->EraseSector(&nandB));
+  CHECK_BYTES(kernelB.ReadAll(0, kBlock), systest::Erased(kBlock));
+  auto second = kernelB.ReadAll(kBlock, kBlock);
+  CHECK(std::equal(second.begin(), second.end(), data.begin() + kBlock));
 
   // eMMC: EraseSlot refuses, EraseSector leaves it alone and succeeds.
   Location apps = Loc("EMMC0", "APPS", "A");
