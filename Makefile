@@ -47,9 +47,11 @@ test-system:
 # closes the output.
 test: test-fuzz test-asan test-aarch64 test-unit test-system
 
-# Benchmarks (host, -O2): library rates beside their baselines.
+# Benchmarks (host, -O2): library rates beside their baselines; then the
+# size of the stripped device library.
 bench:
 	@bench/run.sh
+	@bench/libsize.sh
 
 clean:
 	rm -rf build
