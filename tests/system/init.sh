@@ -26,6 +26,8 @@ RESULTS=/dev/ttyS1
 stty -F /realdev/ttyS1 raw -echo 2>/dev/null
 export STBPLAT_SYSTEST_RESULTS=$RESULTS
 GUEST=/opt/stbplat/systest
+export LD_LIBRARY_PATH=/opt/stbplat/lib
+[ -f /etc/memory-map.ini ] && export STBPLAT_MEMORY_MAP=/etc/memory-map.ini
 ONLY=$(cat /etc/systest-only)
 KVER=$(uname -r)
 

@@ -68,9 +68,17 @@ cp /bin/busybox "$rootfs/bin/busybox"
 for tool in nanddump nandwrite flash_erase mtdinfo mtdpart hdparm smartctl; do
   put_program "$(command -v "$tool")"
 done
-put_program "$guest_bin"
-mkdir -p "$rootfs/opt/stbplat"
-ln -sf "$guest_bin" "$rootfs/opt/stbplat/systest"
+# The guest program and the project's libraries go to /opt/stbplat (the
+# build tree may lie under /tmp, which the guest mounts over).
+mkdir -p "$rootfs/opt/stbplat/lib"
+cp "$guest_bin" "$rootfs/opt/stbplat/systest"
+ldd "$guest_bin" | awk '/=> \//{print $3} /^[ \t]*\/.*ld-linux/{print $1}' |
+  while read -r lib; do
+    case "$lib" in
+      "$build"/*) cp -L "$lib" "$rootfs/opt/stbplat/lib/$(basename "$lib")" ;;
+      *) put "$lib" ;;
+    esac
+  done
 
 # smartctl's drive database: the packaged one, plus a local entry for the
 # emulated disk's model (see init.sh for why).
@@ -99,6 +107,9 @@ for m in $modules; do
   echo "$m:$files" >>"$rootfs/etc/moddeps"
 done
 
+# The box's memory map (devices, partitions, slots) for the platform
+# library, matching the partition table init.sh presents.
+[ -f "$here/memory-map.ini" ] && cp "$here/memory-map.ini" "$rootfs/etc/memory-map.ini"
 cp "$here/init.sh" "$rootfs/init"
 cp "$here/scenarios.sh" "$rootfs/etc/scenarios.sh"
 chmod +x "$rootfs/init"

@@ -31,12 +31,6 @@ const char* const kBoxNames[kTableRows] = {
 
 FlashInterface* Flash() { return FlashInterface::Instance(); }
 
-std::string Hex(unsigned long value) {
-  char text[32];
-  std::snprintf(text, sizeof text, "0x%08lX", value);
-  return text;
-}
-
 // Logical offset (counted over good blocks) of a physical block.
 unsigned long LogicalOf(systest::MtdDevice& dev, unsigned long physicalBlock) {
   unsigned long good = 0;
@@ -113,6 +107,24 @@ SCENARIO("flash.table") {
   isRDLQUpgradeInProgress = false;
   CHECK_EQ(std::string(path ? path : "(null)"), std::string("/dev/mtd8"));
   CHECK_EQ(offset, 0x12345ul);
+  // Through the memory map: BOOT.B starts 512 KiB into the chip.
+  offset = 0;
+  path = flash->LookupMTDPartition(kNorBase + kNorPart + 0x10, &offset);
+  CHECK_EQ(std::string(path ? path : "(null)"), std::string("/dev/mtd1"));
+  CHECK_EQ(offset, 0x10ul);
+  // During an upgrade a slot name resolves to the whole-device partition,
+  // offset by the slot's offset inside its partition.
+  isRDLQUpgradeInProgress = true;
+  offset = 0;
+  path = flash->LookupMTDPartition("NOR0.CFG.B", &offset);
+  std::string upgraded = path ? path : "(null)";
+  systest::ClearLog();
+  const char* nandPath = flash->LookupMTDPartition("NAND0.KERNEL.A", &offset);
+  isRDLQUpgradeInProgress = false;
+  CHECK_EQ(upgraded, std::string("/dev/mtd8"));
+  CHECK_EQ(offset, kNorPart);
+  CHECK(nandPath == nullptr);
+  CHECK_LOG("FlashInterface::LookupMTDPartition: did not find mtd entry\r\n");
   // Below the NOR window nothing matches.
   offset = 1;
   CHECK(flash->LookupMTDPartition(0x10000000ul, &offset) == nullptr);
@@ -234,7 +246,7 @@ SCENARIO("flash.erase_weak_block") {
   CHECK_LOG("NANDErase: marking block at offset 0x000C0000 as bad\n");
   CHECK_EQ(dev.IsBad(6 * kBlock), 1);
   CHECK_EQ(dev.IsBad(4 * kBlock), 1);
-  CHECK_BYTES(GoodBlocks(dev), systest::Erased(29 * kBlock));
+  CHECK_BYTES(GoodBlocks(dev), systest::Erased(30 * kBlock));
 }
 
 SCENARIO("flash.weak_page_relocation") {
@@ -265,6 +277,9 @@ SCENARIO("flash.grave_page") {
   systest::MtdDevice dev("/dev/mtd12");
   REQUIRE(dev.ok());
   REQUIRE(dev.IsBad(8 * kBlock) == 0 && dev.IsBad(9 * kBlock) == 0);
+  // nandsim only fails reads of pages that hold data.
+  REQUIRE(dev.Erase(8 * kBlock, kBlock) == 0);
+  REQUIRE(dev.Write(8 * kBlock + 10 * kPage, systest::Pattern(kPage, 20)) == static_cast<long>(kPage));
   const unsigned long block8 = LogicalOf(dev, 8);
   std::vector<unsigned char> buffer(kBlock);
   systest::ClearLog();
@@ -302,8 +317,9 @@ SCENARIO("flash.nor") {
                    data.begin()));
   CHECK_BYTES(std::vector<unsigned char>(after.begin() + kNorSector, after.begin() + 3 * kNorSector),
               systest::Erased(2 * kNorSector));
-  CHECK(std::equal(after.begin() + 3 * kNorSector, after.begin() + 3 * kNorSector + 16,
-                   data.begin() + 3 * kNorSector - 16 + 0));
+  // Chip byte p of CFG.A holds data[p - (sector - 16)].
+  CHECK(std::equal(after.begin() + 3 * kNorSector, after.begin() + 4 * kNorSector - 16,
+                   data.begin() + 2 * kNorSector + 16));
   // An unaligned erase is refused by the kernel but reported as done.
   systest::ClearLog();
   CHECK(flash->NORErase(cfgA + 16, kNorSector));
@@ -319,7 +335,8 @@ SCENARIO("flash.nor") {
 
 SCENARIO("flash.emmc") {
   FlashInterface* flash = Flash();
-  // 100 bytes 16 bytes before a chunk boundary: one page-sized write.
+  // 100 bytes 16 bytes before a chunk boundary: one page-sized write, whose
+  // bytes past the caller's 100 keep what the device held.
   auto data = systest::Pattern(kPage, 17);
   std::vector<unsigned char> before(2 * kPage, 0x11);
   REQUIRE(systest::WriteFile("/tmp/emmc.fill", before));
@@ -327,7 +344,10 @@ SCENARIO("flash.emmc") {
   CHECK(flash->EMMCWrite(data.data(), 100, "EMMC0.APPS.A", 0x7FFF0));
   std::vector<unsigned char> back(kPage);
   CHECK(flash->EMMCRead(back.data(), kPage, "ANY.NAME.X", 0x7FFF0));
-  CHECK_BYTES(back, data);
+  auto expected = before;
+  expected.resize(kPage);
+  std::copy(data.begin(), data.begin() + 100, expected.begin());
+  CHECK_BYTES(back, expected);
 
   // A long write spans several chunks.
   auto big = systest::Pattern(0x180000 + 300, 18);
@@ -336,6 +356,27 @@ SCENARIO("flash.emmc") {
   std::vector<unsigned char> bigBack(0x180000 + 300);
   CHECK(flash->EMMCRead(bigBack.data(), bigBack.size(), "EMMC0.APPS.A", 0x100000 - 0x1000));
   CHECK(std::equal(bigBack.begin(), bigBack.end(), big.begin()));
+
+  // Fill a range of the slot (1 MiB into the device): split at the next
+  // 512 KiB boundary, nothing outside the range touched.
+  constexpr unsigned long kSlotStart = 0x100000;
+  constexpr unsigned long kFrom = 0x1000;
+  constexpr unsigned long kLength = 0x90000;
+  std::vector<unsigned char> zeros(kLength + 2 * kPage, 0);
+  REQUIRE(systest::WriteFile("/tmp/emmc.zero", zeros));
+  REQUIRE(systest::Shell("dd if=/tmp/emmc.zero of=/dev/mmca bs=2048 seek=" +
+                         std::to_string((kSlotStart + kFrom) / kPage - 1) +
+                         " conv=fsync 2>/dev/null") == 0);
+  Location apps = Loc("EMMC0", "APPS", "A");
+  systest::ClearLog();
+  CHECK(flash->EMMCErase(&apps, kFrom, kLength, 0xA5));
+  CHECK_LOG("EMMCErase: [/dev/mtd14] StartAddress=0x101000 len=0x90000\r\n");
+  std::vector<unsigned char> filled(kLength + 2 * kPage);
+  CHECK(flash->EMMCRead(filled.data(), filled.size(), "EMMC0.APPS.A", kSlotStart + kFrom - kPage));
+  std::vector<unsigned char> expectFill(filled.size(), 0xA5);
+  std::fill(expectFill.begin(), expectFill.begin() + kPage, 0);
+  std::fill(expectFill.end() - kPage, expectFill.end(), 0);
+  CHECK_BYTES(filled, expectFill);
 
   systest::ClearLog();
   CHECK(!flash->EMMCWrite(data.data(), 0, "EMMC0.APPS.A", 0));
@@ -382,6 +423,49 @@ SCENARIO("flash.timing") {
                 length, libWrite, toolWrite, libWrite / toolWrite, libRead, toolRead,
                 libRead / toolRead);
   systest::Info(line);
+}
+
+SCENARIO("flash.erase_slots") {
+  FlashInterface* flash = Flash();
+  systest::MtdDevice chip("/dev/mtd8");
+  REQUIRE(chip.ok());
+  // SPLASH.A: 512 KiB at 2 MiB into the chip, eight sectors.
+  REQUIRE(chip.Erase(0x200000, 0x100000) == 0);
+  auto data = systest::Pattern(0x100000, 21);
+  REQUIRE(chip.Write(0x200000, data) == 0x100000);
+  Location splashA = Loc("NOR0", "SPLASH", "A");
+  CHECK(flash->EraseSlot(&splashA));
+  CHECK_BYTES(chip.ReadAll(0x200000, kNorPart), systest::Erased(kNorPart));
+  auto slotB = chip.ReadAll(0x280000, kNorPart);
+  CHECK(std::equal(slotB.begin(), slotB.end(), data.begin() + kNorPart));
+  // EraseSector clears the first sector of SPLASH.B only.
+  Location splashB = Loc("NOR0", "SPLASH", "B");
+  CHECK(flash->EraseSector(&splashB));
+  CHECK_BYTES(chip.ReadAll(0x280000, kNorSector), systest::Erased(kNorSector));
+  auto rest = chip.ReadAll(0x280000 + kNorSector, kNorSector);
+  CHECK(std::equal(rest.begin(), rest.end(), data.begin() + kNorPart + kNorSector));
+
+  // NAND slot: every good block of KERNEL.B.
+  systest::MtdDevice kernelB("/dev/mtd10");
+  REQUIRE(kernelB.ok());
+  CHECK(NANDWrite(data.data(), 2 * kBlock, "NAND0.KERNEL.B", 0));
+  Location nandB = Loc("NAND0", "KERNEL", "B");
+  CHECK(flash->EraseSlot(&nandB));
+  CHECK_BYTES(GoodBlocks(kernelB), systest::Erased(15 * kBlock));
+  // EraseSector on NAND: block 0 only.
+  CHECK(NANDWriteLoc(data.data(), 2 * kBlock, &nandB, 0));
+  CHECK(flash->EraseSector(&nandB));
+  CHECK_BYTES(kernelB.ReadAll(0, kBlock), systest::Erased(kBlock));
+  auto second = kernelB.ReadAll(kBlock, kBlock);
+  CHECK(std::equal(second.begin(), second.end(), data.begin() + kBlock));
+
+  // eMMC: EraseSlot refuses, EraseSector leaves it alone and succeeds.
+  Location apps = Loc("EMMC0", "APPS", "A");
+  systest::ClearLog();
+  CHECK(!flash->EraseSlot(&apps));
+  CHECK_LOG("FlashInterface::EraseSlot: memory technology for EMMC0.APPS.A is not NOR or NAND, unable to erase\n");
+  CHECK(flash->EraseSector(&apps));
+  CHECK_LOG("FlashInterface::EraseSlot: memory technology for EMMC0.APPS.A is EMMC did not erase\r\n");
 }
 
 #endif

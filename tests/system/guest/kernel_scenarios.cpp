@@ -107,6 +107,35 @@ SCENARIO("kernel.nand_semantics") {
   rc = dev.Seek(kDataSize + kPage);
   systest::Info("kernel: NAND lseek past the end -> " + Outcome(rc, errno));
 
+  // Erase regions: partial blocks, empty, and across a bad block.
+  errno = 0;
+  rc = dev.Erase(0, kBlock + 1);
+  systest::Info("kernel: NAND erase of a block and one byte -> " + Outcome(rc, errno));
+  CHECK_EQ(rc, -1L);
+  errno = 0;
+  rc = dev.Erase(0, 0);
+  systest::Info("kernel: NAND erase of 0 bytes -> " + Outcome(rc, errno));
+  CHECK_EQ(dev.Write(3 * kBlock, systest::Pattern(kPage, 7)), static_cast<long>(kPage));
+  errno = 0;
+  rc = dev.Erase(3 * kBlock, 2 * kBlock);  // blocks 3 and 4 (bad)
+  err = errno;
+  auto block3 = dev.ReadAll(3 * kBlock, kPage);
+  systest::Info("kernel: NAND erase of blocks 3-4 (4 bad) -> " + Outcome(rc, err) + ", block 3 " +
+                (block3 == systest::Erased(kPage) ? "erased" : "kept"));
+  CHECK_EQ(rc, -1L);
+  CHECK_EQ(err, EIO);
+
+  // Reads at and across the end.
+  std::vector<unsigned char> two(2 * kPage);
+  errno = 0;
+  rc = dev.Read(kDataSize - kPage, two);
+  systest::Info("kernel: NAND read of 2 pages at the last page -> " + Outcome(rc, errno));
+  CHECK_EQ(rc, static_cast<long>(kPage));
+  errno = 0;
+  rc = dev.Read(kDataSize, two);
+  systest::Info("kernel: NAND read at the device size -> " + Outcome(rc, errno));
+  CHECK_EQ(rc, 0L);
+
   // Marking a block bad sticks, and its erase then fails with EIO.
   CHECK_EQ(dev.MarkBad(6 * kBlock), 0);
   CHECK_EQ(dev.IsBad(6 * kBlock), 1);
@@ -116,6 +145,17 @@ SCENARIO("kernel.nand_semantics") {
   errno = 0;
   rc = dev.MarkBad(6 * kBlock);
   systest::Info("kernel: NAND marking a bad block again -> " + Outcome(rc, errno));
+  // Writing into a bad block: the MTD layer does not look at the bad-block
+  // table on writes.
+  errno = 0;
+  rc = dev.Write(6 * kBlock + kPage, systest::Pattern(kPage, 8));
+  err = errno;
+  auto inBad = dev.ReadAll(6 * kBlock + kPage, kPage);
+  systest::Info("kernel: NAND write into a block marked bad -> " + Outcome(rc, err) + ", reads " +
+                (inBad == systest::Pattern(kPage, 8) ? "the data" : "other bytes"));
+  errno = 0;
+  rc = dev.Write(4 * kBlock + kPage, systest::Pattern(kPage, 9));
+  systest::Info("kernel: NAND write into a factory-bad block -> " + Outcome(rc, errno));
 
   std::string bad_list;
   for (auto b : dev.BadBlocks()) bad_list += " " + std::to_string(b);

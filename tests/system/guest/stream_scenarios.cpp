@@ -24,7 +24,9 @@ constexpr unsigned char kDataType[4] = {'D', 'A', 'T', 'A'};
 const unsigned char* U(const char* text) { return reinterpret_cast<const unsigned char*>(text); }
 
 std::string DevMem(unsigned long address) {
-  std::string out = systest::ShellOutput("devmem " + std::to_string(address) + " 32");
+  char hex[32];
+  std::snprintf(hex, sizeof hex, "0x%lX", address);
+  std::string out = systest::ShellOutput(std::string("devmem ") + hex + " 32");
   while (!out.empty() && (out.back() == '\n' || out.back() == '\r')) out.pop_back();
   return out;
 }
@@ -40,7 +42,9 @@ SCENARIO("streams.nand_record") {
   const unsigned int start = static_cast<unsigned int>(kBlock + kPage);
   const unsigned int payloadSize = static_cast<unsigned int>(kBlock + 3000);
   auto payload = systest::Pattern(payloadSize, 30);
-  ComponentLocation slot(U("NAND0"), U("KERNEL"), U("A"), start);
+  // The constructor drops its offset argument by design; set it after.
+  ComponentLocation slot(U("NAND0"), U("KERNEL"), U("A"), 0);
+  slot.slotOffset = start;
   {
     Intruder out(&slot);
     REQUIRE(out.isInitedOK);
@@ -77,7 +81,8 @@ SCENARIO("streams.sdram") {
   // SDRAM0.SCRATCH.A: 0x30000000, reserved with memmap= on the kernel line.
   constexpr unsigned long kBase = 0x30000000;
   constexpr unsigned int kOffset = 0x100;
-  ComponentLocation scratch(U("SDRAM0"), U("SCRATCH"), U("A"), kOffset);
+  ComponentLocation scratch(U("SDRAM0"), U("SCRATCH"), U("A"), 0);
+  scratch.slotOffset = kOffset;
   {
     Intruder out(&scratch);
     REQUIRE(out.isInitedOK);
@@ -90,7 +95,9 @@ SCENARIO("streams.sdram") {
   std::string second = DevMem(kBase + kOffset + 4);
   CHECK(second.size() == 10 && second.substr(6) == "C3A5");
 
-  REQUIRE(systest::Shell("devmem " + std::to_string(kBase + kOffset + 8) + " 32 0x78563412") == 0);
+  char poke[64];
+  std::snprintf(poke, sizeof poke, "devmem 0x%lX 32 0x78563412", kBase + kOffset + 8);
+  REQUIRE(systest::Shell(poke) == 0);
   Extruder in(&scratch, false);
   REQUIRE(in.isInitedOK);
   unsigned int first = 0, third = 0;
@@ -102,6 +109,19 @@ SCENARIO("streams.sdram") {
   in += 2;
   CHECK_EQ(in.extrude(&third), 0u);
   CHECK_EQ(third, 0x12345678u);
+
+  // The stream maps the whole slot size from the component's address, so a
+  // component not at the slot's start maps past the slot's end. Where the
+  // slot ends with the reserved range, the kernel refuses the mapping.
+  ComponentLocation last(U("SDRAM0"), U("SCRATCH"), U("B"), 0);
+  last.slotOffset = kOffset;
+  systest::ClearLog();
+  Extruder refused(&last, false);
+  CHECK(!refused.isInitedOK);
+  CHECK_LOG("mmap failed: errno = 1\r\n");
+  last.slotOffset = 0;
+  Extruder whole(&last, false);
+  CHECK(whole.isInitedOK);
 }
 
 #endif
