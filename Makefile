@@ -1,6 +1,6 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-fuzz bench clean
+.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-fuzz test-system bench clean
 
 all: build
 
@@ -38,12 +38,20 @@ FUZZ_SECONDS ?= 20
 test-fuzz: deps
 	scripts/run-fuzz.sh $(FUZZ_SECONDS)
 
-# Everything CI runs.
-test: test-fuzz test-asan test-aarch64 test-unit
+# System tests: the library on a real kernel in a virtual machine (flash
+# simulators, an ATA disk, /dev/mem). Ends with its "N passed, N failed" line.
+test-system:
+	@tests/system/run.sh
 
-# Benchmarks (host, -O2): library rates beside their baselines.
+# Everything CI runs; the system tests come last so that their summary line
+# closes the output.
+test: test-fuzz test-asan test-aarch64 test-unit test-system
+
+# Benchmarks (host, -O2): library rates beside their baselines; then the
+# size of the stripped device library.
 bench:
 	@bench/run.sh
+	@bench/libsize.sh
 
 clean:
 	rm -rf build

@@ -24,7 +24,7 @@ def rate_of(run):
     if "bytes_per_second" in run:
         return run["bytes_per_second"], "B/s"
     if "items_per_second" in run:
-        return run["items_per_second"], "/s"
+        return run["items_per_second"], "op/s"
     return None, None
 
 
@@ -38,10 +38,18 @@ def main(path):
     cases = {}
     order = []
     counts = []
-    for run in report["benchmarks"]:
-        if run.get("run_type", "iteration") != "iteration" or run.get("error_occurred"):
+    runs = report["benchmarks"]
+    # With repetitions, the median of each benchmark stands for it.
+    if any(r.get("aggregate_name") == "median" for r in runs):
+        runs = [r for r in runs if r.get("aggregate_name") == "median"]
+    else:
+        runs = [r for r in runs if r.get("run_type", "iteration") == "iteration"]
+    for run in runs:
+        if run.get("error_occurred"):
+            print(f"ratios: {run['name']}: {run.get('error_message', 'failed')}",
+                  file=sys.stderr)
             continue
-        name = run["name"]
+        name = run.get("run_name", run["name"])
         case, _, impl = name.rpartition("/")
         if "calls" in run and "calls_needed" in run:
             counts.append((case, run["calls"], run["calls_needed"]))
@@ -69,7 +77,7 @@ def main(path):
             if lib_rate is None or base_rate is None or base_unit != unit or base_rate == 0:
                 continue
             print(f"{case:<24} {human_rate(lib_rate, unit):>14}   {other:<9} "
-                  f"{human_rate(base_rate, unit):>14}   {lib_rate / base_rate:6.2f}")
+                  f"{human_rate(base_rate, unit):>14}   {lib_rate / base_rate:6.3g}")
     if counts:
         print()
         header = f"{'case':<24} {'calls made':>12} {'calls needed':>13} {'ratio':>6}"
@@ -77,7 +85,7 @@ def main(path):
         print("-" * len(header))
         for case, calls, needed in counts:
             ratio = calls / needed if needed else float("nan")
-            print(f"{case:<24} {calls:12.0f} {needed:13.0f} {ratio:6.2f}")
+            print(f"{case:<24} {calls:12.0f} {needed:13.0f} {ratio:6.3g}")
     return 0
 
 

@@ -8,5 +8,7 @@ scripts/deps.sh build
 cmake --preset bench >/dev/null
 cmake --build --preset bench >/dev/null
 out=build/bench/results.json
-build/bench/bench/stbplat_bench --benchmark_format=json "$@" >"$out"
+# Three repetitions, the median of each counts: the build machine is shared.
+build/bench/bench/stbplat_bench --benchmark_format=json --benchmark_repetitions=3 \
+  --benchmark_report_aggregates_only=true "$@" >"$out"
 python3 bench/ratios.py "$out"

@@ -8,7 +8,7 @@ for g in "${groups[@]}"; do
   case "$g" in
     build)  want+=(cmake ninja-build g++ clang libgtest-dev libgmock-dev libbenchmark-dev zlib1g-dev pkg-config libclang-rt-14-dev) ;;
     tools)  want+=(libcli11-dev nlohmann-json3-dev) ;;
-    system) want+=(qemu-system-x86 linux-image-amd64 busybox-static mtd-utils smartmontools hdparm cpio) ;;
+    system) want+=(qemu-system-x86 linux-image-amd64 busybox-static mtd-utils smartmontools hdparm cpio kmod xz-utils) ;;
     cross)  want+=(g++-aarch64-linux-gnu binutils-aarch64-linux-gnu qemu-user googletest) ;;
     *) echo "deps.sh: unknown group $g" >&2; exit 2 ;;
   esac

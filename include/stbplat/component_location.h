@@ -26,7 +26,10 @@ class STBPLAT_EXPORT ComponentLocation {
 class STBPLAT_EXPORT ComponentLocationStorage : public ComponentLocation {
  public:
   ComponentLocationStorage();
+  // The names are read raw, as stored; a failed read leaves what it reached.
   unsigned int Read(Extruder& in);
+  // The names go out through a LocationStorage copy, so in standard form: an
+  // empty (all-zero) location is written as 24 '.'.
   unsigned int Store(Intruder* out) const;
 };
 

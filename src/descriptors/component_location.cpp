@@ -57,10 +57,12 @@ unsigned int ComponentLocationStorage::Read(Extruder& in) {
     RECORD_ERROR("Read", "Error reading componentTag\r\n");
     return kDescriptorFieldError;
   }
-  // The names are read raw, as stored: no standard form is applied.
+  // The names are read raw, in place: a name the stream did not reach keeps
+  // its old bytes, not the standard form that building the storage applies.
+  static_assert(sizeof(LocationStorage) == sizeof(Location), "no added fields");
   LocationStorage names(location);
+  std::memcpy(static_cast<void*>(&names), static_cast<const void*>(&location), sizeof(Location));
   unsigned int status = names.Read(in);
-  static_assert(sizeof(Location) == 24, "three 8-byte names");
   std::memcpy(static_cast<void*>(&location), static_cast<const void*>(&names), sizeof(Location));
   if (status != kDescriptorOk) {
     RECORD_ERROR("Read", "Error reading (*pLocationStorage)\r\n");

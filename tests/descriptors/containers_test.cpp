@@ -75,6 +75,21 @@ TEST(FSBLInfo, GoldenRecordDispatchesEveryMember) {
             std::vector<std::string>{"Unknown entry type 0x58545241 in FSBL info\r\n"});
 }
 
+TEST(FSBLInfo, GoldenRecordReadsFromAFileStream) {
+  // File positions are offsets carried in the pointer value.
+  Extruder in((std::string(STBPLAT_TEST_DATA_DIR) + "/fsbl_info.bin").c_str(), true);
+  ASSERT_TRUE(in.isInitedOK);
+  FSBLInfo info;
+  unsigned int size = 0;
+  ASSERT_EQ(info.ReadTLVAndData(in, &size), 0u);
+  EXPECT_EQ(size + 8, Golden("fsbl_info.bin").size());
+  EXPECT_EQ(info.deviceConfig.scbClock, 432);
+  EXPECT_EQ(info.memConfig.memoryControllers.size(), 2u);
+  EXPECT_EQ(info.BseckInfo.ReloadErrors.size(), 3u);
+  EXPECT_EQ(info.versionEntry.sequenceControl.nvSequence, 7u);
+  EXPECT_EQ(in.count(), 0u);
+}
+
 TEST(FSBLInfo, ZeroCountReadsTheVersionOnly) {
   Bytes bytes = FsblEntry(0, Devc(5));  // present but not counted
   Extruder in(bytes.data(), static_cast<unsigned int>(bytes.size()));

@@ -43,6 +43,7 @@ int Run(int argc, char** argv) {
   app.add_flag("-v,--verbose", options.verbose,
                "More library messages on standard error (repeat for more)");
 
+  RegisterRecordCommands(app);
   RegisterChecksumCommands(app);
   RegisterDiskCommands(app);
   RegisterUtilCommands(app);

@@ -39,6 +39,7 @@ struct GlobalOptions {
 GlobalOptions& Options();
 
 // Each command group adds its subcommands to the top-level app.
+void RegisterRecordCommands(CLI::App& app);
 void RegisterDiskCommands(CLI::App& app);
 void RegisterChecksumCommands(CLI::App& app);
 void RegisterUtilCommands(CLI::App& app);

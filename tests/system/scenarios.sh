@@ -1,0 +1,131 @@
+# Scenarios of the system tests, sourced by the guest init (init.sh), which
+# provides load, nand_load, make_table, want, pass, fail, info, run_guest.
+# Box numbering (see LAYOUT in init.sh): mtd0-7 NOR partitions, mtd8 the NOR
+# chip, mtd9 KERNEL.A, mtd10 KERNEL.B, mtd11 ROOTFS.A, mtd12 DATA.A,
+# mtd13 USER.A.
+BLOCK=131072
+PAGE=2048
+
+# check <scenario> <description> <command...>: records the first failing
+# check of a scenario; scenario_end reports it.
+SCEN_FAIL=""
+check() {
+  s=$1; d=$2; shift 2
+  if ! "$@" >/tmp/check.out 2>&1; then
+    [ -z "$SCEN_FAIL" ] && SCEN_FAIL="$d"
+    echo "check failed: $d"; cat /tmp/check.out
+  fi
+}
+scenario_end() {
+  if [ -z "$SCEN_FAIL" ]; then pass "$1"; else fail "$1" "$SCEN_FAIL"; fi
+  SCEN_FAIL=""
+}
+has() { grep -q -- "$1" "$2"; }
+
+# ---- Kernel and mtd-utils only: proves the plumbing ---------------------------
+if want smoke.mtd_table; then
+  s=smoke.mtd_table
+  check $s "table has 15 partitions" test "$(grep -c '^mtd' /proc/mtd)" -eq 15
+  check $s "eMMC row" has 'mtd14: 04000000 00080000 "EMMC0.APPS.A"' /proc/mtd
+  check $s "eMMC node" test -b /dev/mtd14
+  check $s "KERNEL.A row" has 'mtd9: 00200000 00020000 "flash1.KERNEL.A"' /proc/mtd
+  check $s "ROOTFS.A row" has 'mtd11: 00800000 00020000 "flash1.ROOTFS.A"' /proc/mtd
+  check $s "NOR chip row" has 'mtd8: 00400000 00010000 "flash0"' /proc/mtd
+  check $s "NOR partition row" has 'mtd0: 00080000 00010000 "flash0.BOOT.A"' /proc/mtd
+  mtdinfo /dev/mtd11 >/tmp/mi 2>&1; cat /tmp/mi
+  check $s "mtdinfo type" has 'Type:.*nand' /tmp/mi
+  check $s "mtdinfo erase block" has 'Eraseblock size:.*131072 bytes' /tmp/mi
+  check $s "mtdinfo page" has 'Minimum input/output unit size:.*2048 bytes' /tmp/mi
+  check $s "mtdinfo blocks" has 'Amount of eraseblocks: *64 (8388608 bytes' /tmp/mi
+  mtdinfo /dev/mtd8 >/tmp/mi 2>&1
+  check $s "mtdinfo NOR chip size" has 'Amount of eraseblocks: *64 (4194304 bytes' /tmp/mi
+  scenario_end $s
+fi
+
+if want smoke.nand_tools; then
+  s=smoke.nand_tools
+  # KERNEL.B (mtd10) has block 4 bad from the factory.
+  check $s "flash_erase" flash_erase -q /dev/mtd10 0 0
+  dd if=/dev/urandom of=/tmp/d bs=$BLOCK count=10 2>/dev/null
+  check $s "nandwrite" nandwrite -q -p /dev/mtd10 /tmp/d
+  check $s "nanddump" nanddump -q --bb=skipbad -f /tmp/r /dev/mtd10
+  check $s "dump skips the bad block" test "$(stat -c %s /tmp/r)" -eq $((15 * BLOCK))
+  check $s "data reads back" cmp -n $((10 * BLOCK)) /tmp/d /tmp/r
+  nanddump -q --bb=padbad -f /tmp/p /dev/mtd10 2>/dev/null
+  dd if=/tmp/p of=/tmp/p4 bs=$BLOCK skip=4 count=1 2>/dev/null
+  head -c $BLOCK /dev/zero | tr '\0' '\377' >/tmp/ff
+  check $s "bad block dumps as 0xFF" cmp /tmp/p4 /tmp/ff
+  scenario_end $s
+fi
+
+if want smoke.devmem; then
+  s=smoke.devmem
+  check $s "write reserved RAM" devmem 0x30000000 32 0xA5C3F00D
+  check $s "read it back" test "$(devmem 0x30000000 32)" = 0xA5C3F00D
+  scenario_end $s
+fi
+
+if want smoke.disk_tools; then
+  s=smoke.disk_tools
+  hdparm -i /dev/sda >/tmp/hd 2>&1
+  check $s "hdparm model" has 'Model=ST1000DM003-1SB102' /tmp/hd
+  smartctl -d ata -A /dev/sda >/tmp/sm 2>&1
+  check $s "smartctl temperature line" has 'Temperature_Celsius' /tmp/sm
+  info "smartctl -d ata -A /dev/sda: $(grep -i temperature /tmp/sm | tr -s ' ')"
+  check $s "sda on ATA" sh -c 'readlink /sys/class/block/sda | grep -q /ata'
+  scenario_end $s
+fi
+
+if want smoke.emmc; then
+  s=smoke.emmc
+  check $s "mmca size" test "$(blockdev --getsize64 /dev/mmca)" -eq 67108864
+  dd if=/dev/urandom of=/tmp/e bs=4096 count=16 2>/dev/null
+  check $s "write" dd if=/tmp/e of=/dev/mmca bs=4096 seek=100 conv=fsync
+  echo 3 >/proc/sys/vm/drop_caches
+  check $s "read back" sh -c 'dd if=/dev/mmca bs=4096 skip=100 count=16 2>/dev/null | cmp - /tmp/e'
+  scenario_end $s
+fi
+
+# ---- The kernel's MTD behaviour, no library code ------------------------------
+run_guest kernel.nand_semantics
+run_guest kernel.nor_semantics
+
+# ---- Disk probing on the emulated ATA disk --------------------------------------
+for s in disk.is_dev_hdd disk.blk_dev_size disk.vendor_info disk.vendor_type \
+         disk.node_position disk.temperature disk.smart_loop; do
+  run_guest $s
+done
+
+# ---- Flash faults ----------------------------------------------------------------------
+# DATA.A (mtd12) spans NAND blocks 96-127, pages of 2 KiB, 64 a block.
+# Faults: block 2 page 5 fails every write, block 6 fails every erase, block 8
+# page 10 reads back garbage (an uncorrectable ECC error).
+DATA_FIRST_BLOCK=96
+WEAK_PAGE=$(((DATA_FIRST_BLOCK + 2) * 64 + 5))
+WEAK_BLOCK=$((DATA_FIRST_BLOCK + 6))
+GRAVE_PAGE=$(((DATA_FIRST_BLOCK + 8) * 64 + 10))
+nand_faults() {
+  nand_load badblocks=$BAD_AT_LOAD weakpages=$WEAK_PAGE:0 weakblocks=$WEAK_BLOCK:0 \
+            gravepages=$GRAVE_PAGE:0
+}
+if want kernel.nand_faults; then
+  nand_faults && run_guest kernel.nand_faults || fail kernel.nand_faults "nandsim with faults"
+fi
+
+# ---- FlashInterface ---------------------------------------------------------------------
+# Scenarios the guest program does not know (library built without flash
+# support) are reported as skipped rather than run.
+run_flash() {
+  if "$GUEST" --list | grep -qx "$1"; then run_guest "$1"; else info "skipped $1 (not in this build)"; fi
+}
+nand_load badblocks=$BAD_AT_LOAD
+for s in flash.table flash.nand_slot flash.nand_partial_page flash.mtd_utils flash.nor \
+         flash.emmc flash.erase_slots flash.timing streams.nand_record streams.sdram; do
+  run_flash $s
+done
+if want flash.erase_weak_block || want flash.weak_page_relocation || want flash.grave_page; then
+  nand_faults
+  for s in flash.erase_weak_block flash.weak_page_relocation flash.grave_page; do
+    run_flash $s
+  done
+fi

@@ -1,0 +1,104 @@
+#include "location_arg.h"
+
+#include <algorithm>
+#include <cctype>
+#include <cerrno>
+#include <cstdlib>
+#include <cstring>
+
+#include "tool.h"
+
+namespace stbtool {
+namespace {
+
+constexpr size_t kNameWidth = 8;
+constexpr size_t kTagWidth = 4;
+constexpr unsigned long kKiB = 1024;
+
+bool IsNameChar(char c) {
+  return std::isalnum(static_cast<unsigned char>(c)) || c == '_' || c == '-';
+}
+
+std::string NameOf(const unsigned char* name) {
+  std::string text;
+  for (size_t i = 0; i < kNameWidth && name[i] != '.' && name[i] != 0; ++i)
+    text += static_cast<char>(name[i]);
+  return text;
+}
+
+}  // namespace
+
+unsigned long ParseNumber(const std::string& text, const std::string& what) {
+  if (text.empty() || text[0] == '-') throw UsageError(what + ": '" + text + "' is not a number");
+  errno = 0;
+  char* end = nullptr;
+  unsigned long value = std::strtoul(text.c_str(), &end, 0);
+  if (end == text.c_str() || errno != 0) throw UsageError(what + ": '" + text + "' is not a number");
+  unsigned long scale = 1;
+  if (*end != '\0') {
+    char suffix = static_cast<char>(std::toupper(static_cast<unsigned char>(*end)));
+    if (suffix == 'K') scale = kKiB;
+    else if (suffix == 'M') scale = kKiB * kKiB;
+    else if (suffix == 'G') scale = kKiB * kKiB * kKiB;
+    else throw UsageError(what + ": '" + text + "' is not a number");
+    ++end;
+    if (*end == 'i' || *end == 'I') ++end;
+    if (*end == 'B' || *end == 'b') ++end;
+    if (*end != '\0') throw UsageError(what + ": '" + text + "' is not a number");
+  }
+  return value * scale;
+}
+
+bool ParseLocationArg(const std::string& text, const std::string& what, LocationArg* out) {
+  std::string names = text;
+  std::string offset;
+  size_t plus = text.find('+');
+  if (plus != std::string::npos) {
+    names = text.substr(0, plus);
+    offset = text.substr(plus + 1);
+  }
+  std::string parts[3];
+  size_t part = 0;
+  for (char c : names) {
+    if (c == '.') {
+      if (++part == 3) return false;
+    } else if (IsNameChar(c)) {
+      parts[part] += c;
+    } else {
+      return false;
+    }
+  }
+  if (part != 2 || parts[0].empty() || parts[1].empty() || parts[2].empty()) return false;
+  static const char* const labels[] = {"device", "partition", "slot"};
+  for (size_t i = 0; i < 3; ++i)
+    if (parts[i].size() > kNameWidth)
+      throw UsageError(what + ": " + labels[i] + " name '" + parts[i] + "' in '" + text +
+                       "' is longer than 8 characters");
+  LocationArg arg;
+  arg.device = parts[0];
+  arg.partition = parts[1];
+  arg.slot = parts[2];
+  if (plus != std::string::npos) {
+    arg.offset = ParseNumber(offset, what + " offset");
+    arg.hasOffset = true;
+  }
+  *out = arg;
+  return true;
+}
+
+ComponentLocation ToComponentLocation(const LocationArg& arg, const std::string& tag) {
+  ComponentLocation component(reinterpret_cast<const unsigned char*>(arg.device.c_str()),
+                              reinterpret_cast<const unsigned char*>(arg.partition.c_str()),
+                              reinterpret_cast<const unsigned char*>(arg.slot.c_str()), 0);
+  std::memset(component.componentTag, 0, sizeof component.componentTag);
+  std::memcpy(component.componentTag, tag.data(), std::min(tag.size(), kTagWidth));
+  component.slotOffset = arg.offset;
+  return component;
+}
+
+std::string LocationText(const Location& location) {
+  return NameOf(location.deviceName) + "." + NameOf(location.partitionName) + "." +
+         NameOf(location.slotName);
+}
+
+}  // namespace stbtool

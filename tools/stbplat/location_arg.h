@@ -1,0 +1,36 @@
+// Component locations on the command line: DEVICE.PARTITION.SLOT[+OFFSET],
+// such as NAND0.FSBLINFO.A or NOR0.BOOT.A+0x400. Names are at most 8
+// characters and are upper-cased as the library stores them.
+#ifndef STBPLAT_TOOL_LOCATION_ARG_H
+#define STBPLAT_TOOL_LOCATION_ARG_H
+
+#include <string>
+
+#include "stbplat/component_location.h"
+
+namespace stbtool {
+
+struct LocationArg {
+  std::string device, partition, slot;
+  unsigned long offset = 0;
+  bool hasOffset = false;
+};
+
+// True when text has the shape of a location. On a shape that is almost one
+// (three dot-separated names, but a name too long or a bad offset), throws
+// UsageError naming `what` and the problem.
+bool ParseLocationArg(const std::string& text, const std::string& what, LocationArg* out);
+
+// The library's form, with the given component tag (up to 4 characters).
+ComponentLocation ToComponentLocation(const LocationArg& arg, const std::string& tag = "");
+
+// "NAND0.KERNEL.A" from the library's 8-byte names.
+std::string LocationText(const Location& location);
+
+// Parses a number in C notation (0x.., 0.., decimal) with an optional K, M
+// or G suffix (powers of 1024). Throws UsageError naming `what`.
+unsigned long ParseNumber(const std::string& text, const std::string& what);
+
+}  // namespace stbtool
+
+#endif
