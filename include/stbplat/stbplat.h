@@ -36,4 +36,9 @@
 #include "stbplat/string_checks.h"
 #include "stbplat/subsystem_init.h"
 
+// Flash access and the platform memory map
+#include "stbplat/flash_c.h"
+#include "stbplat/flash_interface.h"
+#include "stbplat/memory_map.h"
+
 #endif

@@ -1,0 +1,169 @@
+// A device for the flash tests: NOR, NAND, eMMC, a file slot and physical
+// memory, described by a memory map and a /proc/mtd table in the simulator.
+#ifndef STBPLAT_TESTS_FLASH_FLASH_FIXTURE_H
+#define STBPLAT_TESTS_FLASH_FLASH_FIXTURE_H
+
+#include <gtest/gtest.h>
+
+#include <cstdio>
+#include <string>
+#include <vector>
+
+#include "flash/flash_test_hook.h"
+#include "stbplat/flash_interface.h"
+#include "stbplat/location.h"
+#include "stbplat/memory_map.h"
+#include "support/flash_sim.h"
+#include "support/log_capture.h"
+
+namespace stbplat {
+namespace test {
+
+constexpr unsigned long kNorBase = 0xE0000000UL;
+constexpr unsigned long kNorSector = 0x10000;
+constexpr unsigned long kNandBlock = 0x20000;
+constexpr unsigned long kNandPage = 2048;
+constexpr unsigned long kNandSize = 0x100000;
+constexpr unsigned long kSdramBase = 0x30000000UL;
+constexpr const char* kNandData = "/dev/mtd2";
+constexpr const char* kEmmcNode = "/dev/mmca";
+
+inline const char* DeviceMap() {
+  return "; the test device\n"
+         "[device NOR0]\n"
+         "technology = SPI_NOR\n"
+         "base = 0xE0000000\n"
+         "size = 0x400000\n"
+         "[partition NOR0.BOOT]\n"
+         "offset = 0\n"
+         "size = 0x80000\n"
+         "node = /dev/mtd8\n"
+         "[slot NOR0.BOOT.FSBL]\n"
+         "offset = 0\n"
+         "size = 0x30000\n"
+         "node = /dev/mtd0\n"
+         "[slot NOR0.BOOT.CONFIG]\n"
+         "offset = 0x40000\n"
+         "size = 0x40000\n"
+         "node = /dev/mtd1\n"
+         "[partition NOR0.MISC]\n"
+         "offset = 0x80000\n"
+         "size = 0x10000\n"
+         "[slot NOR0.MISC.TINY]\n"
+         "offset = 0\n"
+         "size = 0x8000\n"
+         "[device NAND0]\n"
+         "technology = NAND\n"
+         "base = 0x0\n"
+         "size = 0x200000\n"
+         "[partition NAND0.SYS]\n"
+         "offset = 0\n"
+         "size = 0x200000\n"
+         "[slot NAND0.SYS.DATA]\n"
+         "offset = 0\n"
+         "size = 0x100000\n"
+         "node = /dev/mtd2\n"
+         "[slot NAND0.SYS.SPARE]\n"
+         "offset = 0x100000\n"
+         "size = 0x100000\n"
+         "node = /dev/mtd3\n"
+         "[device EMMC0]\n"
+         "technology = EMMC\n"
+         "base = 0\n"
+         "size = 0x1000000\n"
+         "[partition EMMC0.APP]\n"
+         "offset = 0\n"
+         "size = 0x1000000\n"
+         "node = /dev/mmca\n"
+         "[slot EMMC0.APP.STORE]\n"
+         "offset = 0x100000\n"
+         "size = 0x100000\n"
+         "node = /dev/mtd4\n"
+         "[device FS0]\n"
+         "technology = FILESYS\n"
+         "base = 0\n"
+         "size = 0x100000\n"
+         "[partition FS0.CFG]\n"
+         "size = 0x100000\n"
+         "[slot FS0.CFG.USER]\n"
+         "offset = 0\n"
+         "size = 0x1000\n"
+         "file = /data/user.cfg\n"
+         "[device SDRAM0]\n"
+         "technology = SDRAM\n"
+         "base = 0x30000000\n"
+         "size = 0x100000\n"
+         "[partition SDRAM0.RESV]\n"
+         "size = 0x100000\n"
+         "[slot SDRAM0.RESV.ARGS]\n"
+         "offset = 0x1010\n"
+         "size = 0x1000\n";
+}
+
+// Writes text to a temporary file and removes it again.
+class TempFile {
+ public:
+  explicit TempFile(const std::string& text) {
+    char name[] = "/tmp/stbplat-map-XXXXXX";
+    int fd = mkstemp(name);
+    path_ = name;
+    FILE* file = fdopen(fd, "w");
+    std::fputs(text.c_str(), file);
+    std::fclose(file);
+  }
+  ~TempFile() { std::remove(path_.c_str()); }
+  const std::string& path() const { return path_; }
+
+ private:
+  std::string path_;
+};
+
+inline bool LoadMap(const std::string& text, std::string* error = nullptr) {
+  TempFile file(text);
+  std::string ignored;
+  return ExtendedMemoryMapStructure::Load(file.path().c_str(), error ? error : &ignored);
+}
+
+inline Location MakeLocation(const char* device, const char* partition, const char* slot) {
+  return Location(reinterpret_cast<const unsigned char*>(device),
+                  reinterpret_cast<const unsigned char*>(partition),
+                  reinterpret_cast<const unsigned char*>(slot));
+}
+
+inline std::vector<uint8_t> Pattern(size_t length, uint8_t seed) {
+  std::vector<uint8_t> bytes(length);
+  for (size_t i = 0; i < length; ++i) bytes[i] = static_cast<uint8_t>(seed + i * 7 + (i >> 8));
+  return bytes;
+}
+
+// The simulator with the test device, the memory map loaded, and a fresh
+// flash singleton (created by the first Flash()).
+class FlashTest : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    flash::ResetFlashInterfaceForTest();
+    sim_.AddMtd(0, "flash0.BOOT.FSBL", SimKind::kNor, 0x40000, kNorSector);
+    sim_.AddMtd(1, "flash0.BOOT.CONFIG", SimKind::kNor, 0x40000, kNorSector);
+    sim_.AddMtd(2, "NAND0.SYS.DATA", SimKind::kNand, kNandSize, kNandBlock, kNandPage);
+    sim_.AddMtd(3, "NAND0.SYS.SPARE", SimKind::kNand, kNandSize, kNandBlock, kNandPage);
+    sim_.AddEmmc(kEmmcNode, 0x1000000);
+    sim_.AddMtd(4, "EMMC0.APP.STORE", SimKind::kNor, 0, kNorSector);
+    sim_.Alias("/dev/mtd4", kEmmcNode);
+    sim_.AddMtd(8, "flash0", SimKind::kNor, 0x400000, kNorSector);
+    sim_.AddMtd(9, "flash1", SimKind::kNand, 0x200000, kNandBlock, kNandPage);
+    sim_.AddMemory(kSdramBase, 0x100000);
+    ASSERT_TRUE(LoadMap(DeviceMap()));
+  }
+  void TearDown() override {
+    flash::ResetFlashInterfaceForTest();
+    ExtendedMemoryMapStructure::Reset();
+  }
+  FlashInterface& Flash() { return *FlashInterface::Instance(); }
+
+  FlashSim sim_;
+};
+
+}  // namespace test
+}  // namespace stbplat
+
+#endif

@@ -1,0 +1,139 @@
+// The memory-map stand-in: loading, refusing bad files, and its queries.
+#include <fstream>
+#include <sstream>
+
+#include "flash_fixture.h"
+
+namespace stbplat {
+namespace test {
+namespace {
+
+class MemoryMapTest : public ::testing::Test {
+ protected:
+  void TearDown() override { ExtendedMemoryMapStructure::Reset(); }
+  ExtendedMemoryMapStructure& Map() { return *ExtendedMemoryMapStructure::Instance(); }
+};
+
+TEST_F(MemoryMapTest, QueriesOfTheTestDevice) {
+  ASSERT_TRUE(LoadMap(DeviceMap()));
+  ExtendedMemoryMapStructure& map = Map();
+  EXPECT_TRUE(map.IsCreated());
+  Location location;
+  ASSERT_TRUE(map.GetLocation("NAND0.SYS.SPARE", &location));
+  EXPECT_EQ(location.GetNameString(), "NAND0.SYS.SPARE");
+  EXPECT_FALSE(map.GetLocation("NAND0.SYS", &location));
+  EXPECT_FALSE(map.GetLocation("NAND0.SYS.SPARE.X", &location));
+  EXPECT_TRUE(map.IsNandDevice(&location));
+  EXPECT_FALSE(map.IsEMMCDevice(&location));
+  unsigned long size = 0;
+  unsigned long offset = 0;
+  ASSERT_TRUE(map.GetSlotSizeAndOffset(&location, &size, &offset));
+  EXPECT_EQ(size, 0x100000UL);
+  EXPECT_EQ(offset, 0x100000UL);
+  EXPECT_TRUE(map.DoesDeviceExist("NAND0..."));
+  EXPECT_TRUE(map.DoesDeviceExist("NOR0"));
+  EXPECT_FALSE(map.DoesDeviceExist("NAND1..."));
+  ASSERT_TRUE(map.GetDeviceSize("NOR0....", 0, &size));
+  EXPECT_EQ(size, 0x400000UL);
+  EXPECT_FALSE(map.GetDeviceSize("NOR0....", 1, &size));
+  const MemoryDeviceEntry* device = map.GetDevice("NOR0....");
+  ASSERT_NE(device, nullptr);
+  EXPECT_EQ(std::string(reinterpret_cast<const char*>(device->technology), 8), "SPI_NOR.");
+  ASSERT_EQ(device->partitions.size(), 2u);
+  EXPECT_EQ(device->partitions[0].slots.size(), 2u);
+
+  Location config = MakeLocation("NOR0", "BOOT", "CONFIG");
+  unsigned long address = 0;
+  ASSERT_TRUE(map.GetPhysAddressFromLocation(&config, 0x10, &address, &size));
+  EXPECT_EQ(address, kNorBase + 0x40010);
+  EXPECT_EQ(size, 0x40000UL);
+  EXPECT_FALSE(map.GetPhysAddressFromLocation(&config, 0x40001, &address, &size));
+  Location found;
+  ASSERT_TRUE(map.GetLocationInfoFromPhysAddr(kNorBase + 0x80004, &found, &offset));
+  EXPECT_EQ(found.GetNameString(), "NOR0.MISC.TINY");
+  EXPECT_EQ(offset, 4UL);
+  EXPECT_FALSE(map.GetLocationInfoFromPhysAddr(kNorBase + 0x8000 + 0x80000, &found, &offset));
+  ASSERT_TRUE(map.GetDeviceBaseAddress(&config, 0, &address));
+  EXPECT_EQ(address, kNorBase);
+
+  unsigned long extra = 0;
+  EXPECT_STREQ(map.GetMTDorFileName(&config, &extra), "/dev/mtd1");
+  EXPECT_EQ(extra, 0UL);
+  Location tiny = MakeLocation("NOR0", "MISC", "TINY");
+  EXPECT_EQ(map.GetMTDorFileName(&tiny, &extra), nullptr);
+  Location args = MakeLocation("SDRAM0", "RESV", "ARGS");
+  EXPECT_EQ(map.GetMTDorFileName(&args, &extra), nullptr);
+  Location user = MakeLocation("FS0", "CFG", "USER");
+  EXPECT_TRUE(map.IsSlotAFile(&user));
+  EXPECT_STREQ(map.GetSlotFileName(&user), "/data/user.cfg");
+  EXPECT_FALSE(map.IsSlotAFile(&config));
+  EXPECT_EQ(map.GetSlotFileName(&config), nullptr);
+}
+
+TEST_F(MemoryMapTest, PartitionNodeGivesTheSlotOffsetAsExtra) {
+  ASSERT_TRUE(LoadMap("[device NAND0]\ntechnology = NAND\nbase = 0\nsize = 0x100000\n"
+                      "[partition NAND0.SYS]\noffset = 0\nsize = 0x100000\nnode = /dev/mtd5\n"
+                      "[slot NAND0.SYS.B]\noffset = 0x20000\nsize = 0x20000\n"));
+  Location b = MakeLocation("NAND0", "SYS", "B");
+  unsigned long extra = 4;
+  EXPECT_STREQ(Map().GetMTDorFileName(&b, &extra), "/dev/mtd5");
+  EXPECT_EQ(extra, 0x20004UL);
+}
+
+TEST_F(MemoryMapTest, DocumentedExampleLoads) {
+  std::ifstream doc(std::string(STBPLAT_SOURCE_DIR) + "/docs/memory-map.md");
+  std::stringstream text;
+  text << doc.rdbuf();
+  std::string all = text.str();
+  std::size_t start = all.find("```ini\n");
+  ASSERT_NE(start, std::string::npos);
+  start += 7;
+  std::string example = all.substr(start, all.find("```", start) - start);
+  std::string error;
+  ASSERT_TRUE(LoadMap(example, &error)) << error;
+  Location user = MakeLocation("FS0", "CFG", "USER");
+  EXPECT_STREQ(Map().GetSlotFileName(&user), "/var/lib/stb/user.cfg");
+}
+
+TEST_F(MemoryMapTest, BadFilesAreRefusedNamingTheLine) {
+  struct Case {
+    const char* text;
+    const char* message;
+  };
+  const Case cases[] = {
+      {"[device NOR0]\ntechnology = SPI_NOR\nbase = 0\nsize = 0x1000\n"
+       "[partition NOR0.A]\noffset = 0x800\nsize = 0x1000\n",
+       "line 5: partition beyond its container"},
+      {"[device NOR0]\ntechnology = SPI_NOR\nbase = 0\nsize = 0x1000\n"
+       "[partition NOR0.A]\nsize = 0x1000\n"
+       "[slot NOR0.A.X]\nsize = 0x800\n[slot NOR0.A.Y]\noffset = 0x7FF\nsize = 0x10\n",
+       "line 9: slot overlaps another"},
+      {"[device NOR0]\ntechnology = SPI_NOR\nbase = 0\nsize = 0x1000\n"
+       "[partition NOR0.A]\nsize = 0x1000\n"
+       "[slot NOR0.A.X]\noffset = 0xFFFFFFFFFFFFFFF0\nsize = 0x20\n",
+       "line 7: slot beyond its container"},
+      {"[device NOR0]\ntechnology = SPI_NOR\nbase = 0xFFFFFFFFFFFFF000\nsize = 0x2000\n",
+       "line 1: device range wraps or is empty"},
+      {"[device NOR0]\ntechnology = SPI_NOR\nsize = 0x2000\n",
+       "line 1: device needs technology, base and size"},
+      {"[device NOR0]\ntechnology = SPI_NOR\nbase = zero\n", "line 3: bad device entry base"},
+      {"[slot NOR0.A.X]\nsize = 1\n", "line 1: slot of undeclared partition NOR0.A"},
+      {"[device TOOLONGNAME]\nsize = 1\n", "line 1: bad device name"},
+      {"[device NOR0]\nno separator here\n", "line 2: malformed line"},
+      {"[volume X]\nsize = 1\n", "line 1: unknown section [volume X]"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.text);
+    std::string error;
+    EXPECT_FALSE(LoadMap(c.text, &error));
+    EXPECT_NE(error.find(c.message), std::string::npos) << error;
+    EXPECT_FALSE(Map().IsCreated());
+  }
+  std::string error;
+  EXPECT_FALSE(ExtendedMemoryMapStructure::Load("/nonexistent/map.ini", &error));
+  EXPECT_NE(error.find("cannot open"), std::string::npos);
+}
+
+}  // namespace
+}  // namespace test
+}  // namespace stbplat

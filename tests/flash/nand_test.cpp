@@ -1,0 +1,189 @@
+// NAND reads and writes: block cutting, the partial-page buffer, bad-block
+// skipping and relocation.
+#include <cerrno>
+
+#include "flash_fixture.h"
+
+namespace stbplat {
+namespace test {
+namespace {
+
+using Span = std::pair<uint64_t, uint64_t>;
+constexpr const char* kDataSlot = "NAND0.SYS.DATA";
+
+using NandTest = FlashTest;
+
+TEST_F(NandTest, ReadCutsAtBlocksAndSkipsBadOnes) {
+  FlashInterface& flash = Flash();
+  sim_.MarkBad(kNandData, kNandBlock);
+  std::vector<uint8_t> first = Pattern(0x100, 1);
+  std::vector<uint8_t> second = Pattern(0x100, 2);
+  sim_.Poke(kNandData, kNandBlock - 0x100, first);
+  sim_.Poke(kNandData, 2 * kNandBlock, second);
+  std::vector<uint8_t> back(0x200);
+  ASSERT_TRUE(flash.NANDRead(back.data(), back.size(), kDataSlot, kNandBlock - 0x100));
+  EXPECT_EQ(std::vector<uint8_t>(back.begin(), back.begin() + 0x100), first);
+  EXPECT_EQ(std::vector<uint8_t>(back.begin() + 0x100, back.end()), second);
+  LogCapture log;
+  EXPECT_FALSE(flash.NANDRead(back.data(), back.size(), "NAND0.SYS.NONE", 0));
+  EXPECT_TRUE(log.Contains("NANDRead: LookupMTDPartition for NAND0.SYS.NONE failed\r\n"));
+  sim_.AddEccFailure(kNandData, 0x10);
+  EXPECT_FALSE(flash.NANDRead(back.data(), back.size(), kDataSlot, 0));
+  EXPECT_TRUE(log.Contains(
+      "NANDRead: LinuxFlashRead failed in /dev/mtd2 at offset 0x00000000, attempting "
+      "recovery\r\n"));
+  EXPECT_EQ(sim_.OpenCount(), 0);
+}
+
+TEST_F(NandTest, ShortWriteIsOnlyBufferedUntilFlushed) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(100, 5);
+  sim_.ClearHistory();
+  ASSERT_TRUE(flash.NANDWrite(data.data(), data.size(), kDataSlot, kNandPage));
+  EXPECT_TRUE(sim_.Writes(kNandData).empty());
+  EXPECT_EQ(flash.currNANDBufferOffset, 100UL);
+  EXPECT_STREQ(flash.pendingNANDDevice, kNandData);
+  EXPECT_EQ(flash.pendingNANDOffset, kNandPage);
+  flash.NANDFlushWrite();
+  ASSERT_EQ(sim_.Writes(kNandData).size(), 1u);
+  EXPECT_EQ(sim_.Writes(kNandData)[0], Span(kNandPage, kNandPage));
+  EXPECT_EQ(sim_.Bytes(kNandData, kNandPage, 100), data);
+  EXPECT_EQ(flash.currNANDBufferOffset, 0UL);
+  EXPECT_EQ(flash.pendingNANDDevice, nullptr);
+  flash.NANDFlushWrite();  // nothing buffered: nothing happens
+  EXPECT_EQ(sim_.Writes(kNandData).size(), 1u);
+}
+
+TEST_F(NandTest, ContinuedWriteCompletesTheBufferedPage) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(3 * kNandPage + 100, 8);
+  ASSERT_TRUE(flash.NANDWrite(data.data(), 100, kDataSlot, 0));
+  ASSERT_TRUE(flash.NANDWrite(data.data() + 100, 50, kDataSlot, 100));  // still inside the page
+  EXPECT_EQ(flash.currNANDBufferOffset, 150UL);
+  sim_.ClearHistory();
+  ASSERT_TRUE(flash.NANDWrite(data.data() + 150, data.size() - 150, kDataSlot, 150));
+  // One page from the buffer, the whole pages from the source in one
+  // write, the tail buffered again.
+  ASSERT_EQ(sim_.Writes(kNandData).size(), 2u);
+  EXPECT_EQ(sim_.Writes(kNandData)[0], Span(0, kNandPage));
+  EXPECT_EQ(sim_.Writes(kNandData)[1], Span(kNandPage, 2 * kNandPage));
+  EXPECT_EQ(flash.currNANDBufferOffset, 100UL);
+  EXPECT_EQ(flash.pendingNANDOffset, 3 * kNandPage);
+  flash.NANDFlushWrite();
+  EXPECT_EQ(sim_.Bytes(kNandData, 0, data.size()), data);
+}
+
+TEST_F(NandTest, MisalignedWritesAreRefused) {
+  FlashInterface& flash = Flash();
+  LogCapture log;
+  std::vector<uint8_t> data = Pattern(100, 1);
+  EXPECT_FALSE(flash.NANDWrite(data.data(), 10, kDataSlot, 5));
+  EXPECT_TRUE(log.Contains(
+      "NANDWrite: writing in the middle of a block and currNANDBufferOffset == 0\r\n"));
+  ASSERT_TRUE(flash.NANDWrite(data.data(), 100, kDataSlot, 0));
+  EXPECT_FALSE(flash.NANDWrite(data.data(), 10, kDataSlot, 40));
+  EXPECT_TRUE(log.Contains(
+      "NANDWrite: writing in the middle of a block and write start doesn't align with "
+      "currNANDBufferOffset\r\n"));
+  EXPECT_FALSE(flash.NANDWrite(data.data(), 10, kDataSlot, kNandPage));
+  EXPECT_TRUE(log.Contains("NANDWrite: not writing a full block and currNANDBufferOffset != 0\r\n"));
+  EXPECT_FALSE(flash.NANDWrite(nullptr, 10, kDataSlot, 0));
+  EXPECT_FALSE(flash.NANDWrite(data.data(), 0, kDataSlot, 0));
+  EXPECT_TRUE(log.Contains("FlashInterface::NANDWrite: invalid parameters\r\n"));
+}
+
+TEST_F(NandTest, FailedWriteMovesEarlierDataToTheNextGoodBlock) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(4 * kNandPage, 3);
+  ASSERT_TRUE(flash.NANDWrite(data.data(), 2 * kNandPage, kDataSlot, 0));
+  sim_.MarkBad(kNandData, kNandBlock);  // the next block is bad: skipped
+  sim_.FailWritesAt(kNandData, 2 * kNandPage);
+  LogCapture log;
+  ASSERT_TRUE(flash.NANDWrite(data.data() + 2 * kNandPage, 2 * kNandPage, kDataSlot,
+                              2 * kNandPage));
+  EXPECT_TRUE(sim_.IsBad(kNandData, 0));
+  EXPECT_EQ(flash.blocksMarkedBad, 1UL);
+  // Block 0 is bad now, block 1 was bad: the data lives in block 2.
+  EXPECT_EQ(sim_.Bytes(kNandData, 2 * kNandBlock, data.size()), data);
+  std::vector<uint8_t> back(data.size());
+  ASSERT_TRUE(flash.NANDRead(back.data(), back.size(), kDataSlot, 0));
+  EXPECT_EQ(back, data);
+  EXPECT_TRUE(log.Contains("HandleBadNANDBlock: moving block data (4096 bytes) to next block\r\n"));
+  EXPECT_TRUE(log.Contains("HandleBadNANDBlock: Skipping a bad block at offset 0x00020000\r\n"));
+  EXPECT_TRUE(log.Contains("HandleBadNANDBlock: marking block at offset 0x00000000 as bad\r\n"));
+  EXPECT_EQ(sim_.OpenCount(), 0);
+}
+
+TEST_F(NandTest, FailureAtBlockStartMarksWithoutMoving) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(kNandPage, 4);
+  sim_.FailWritesAt(kNandData, 0);
+  sim_.ClearHistory();
+  LogCapture log;
+  ASSERT_TRUE(flash.NANDWrite(data.data(), data.size(), kDataSlot, 0));
+  EXPECT_TRUE(sim_.IsBad(kNandData, 0));
+  EXPECT_FALSE(log.Contains("moving block data"));
+  EXPECT_EQ(sim_.Bytes(kNandData, kNandBlock, kNandPage), data);
+}
+
+TEST_F(NandTest, SixthConsecutiveFailureAborts) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(kNandPage, 4);
+  for (unsigned long block = 0; block < 6; ++block)
+    sim_.FailWritesAt(kNandData, block * kNandBlock);
+  LogCapture log;
+  EXPECT_FALSE(flash.NANDWrite(data.data(), data.size(), kDataSlot, 0));
+  EXPECT_TRUE(log.Contains("NANDWrite: too many bad blocks, aborting\r\n"));
+  EXPECT_EQ(flash.blocksMarkedBad, 5UL);
+  EXPECT_FALSE(sim_.IsBad(kNandData, 5 * kNandBlock));
+}
+
+TEST_F(NandTest, FlushRecoversFromABadBlock) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(10, 4);
+  ASSERT_TRUE(flash.NANDWrite(data.data(), data.size(), kDataSlot, kNandBlock));
+  sim_.FailWritesAt(kNandData, kNandBlock);
+  LogCapture log;
+  flash.NANDFlushWrite();
+  EXPECT_TRUE(log.Contains(
+      "NANDFlushWrite: found a bad block in /dev/mtd2 at offset 0x00020000, attempting "
+      "recovery\r\n"));
+  EXPECT_EQ(sim_.Bytes(kNandData, 2 * kNandBlock, 10), data);
+  EXPECT_EQ(flash.currNANDBufferOffset, 0UL);
+}
+
+// Every seam call of a NAND write that crosses a bad block fails in turn;
+// the write reports a result, the state is consistent, no descriptor leaks.
+TEST_F(NandTest, EachFailingCallLeavesNoDescriptorOpen) {
+  std::vector<uint8_t> data = Pattern(kNandBlock + 3 * kNandPage, 6);
+  int calls = 0;
+  {
+    FlashInterface& flash = Flash();
+    sim_.MarkBad(kNandData, kNandBlock);
+    sim_.ClearHistory();
+    ASSERT_TRUE(flash.NANDWrite(data.data(), data.size(), kDataSlot, 0));
+    calls = sim_.CallCount(SimCall::kAny);
+  }
+  ASSERT_GT(calls, 10);
+  for (int nth = 1; nth <= calls; ++nth) {
+    SCOPED_TRACE(nth);
+    flash::ResetFlashInterfaceForTest();
+    FlashSim sim;
+    sim.AddMtd(2, "NAND0.SYS.DATA", SimKind::kNand, kNandSize, kNandBlock, kNandPage);
+    sim.MarkBad(kNandData, kNandBlock);
+    FlashInterface& flash = *FlashInterface::Instance();
+    sim.FailCall(SimCall::kAny, nth, EIO);
+    bool written = flash.NANDWrite(data.data(), data.size(), kDataSlot, 0);
+    EXPECT_EQ(sim.OpenCount(), 0);
+    if (written) {
+      std::vector<uint8_t> back(data.size());
+      sim.ClearFaults();
+      ASSERT_TRUE(flash.NANDRead(back.data(), back.size(), kDataSlot, 0));
+      EXPECT_EQ(back, data);
+    }
+  }
+}
+
+}  // namespace
+}  // namespace test
+}  // namespace stbplat

@@ -1,0 +1,185 @@
+// The partition table read from /proc/mtd, the measured sizes and the three
+// lookups.
+#include <cstring>
+
+#include "flash_fixture.h"
+
+namespace stbplat {
+namespace test {
+namespace {
+
+using PartitionTableTest = FlashTest;
+
+TEST_F(PartitionTableTest, NamesAreNormalisedToMemoryMapDevices) {
+  sim_.SetProcMtd(
+      "dev:    size   erasesize  name\n"
+      "mtd0: 00040000 00010000 \"NOR0\"\n"
+      "mtd1: 00040000 00010000 \"NAND0\"\n"
+      "mtd2: 00040000 00010000 \"flash0.kernel\"\n"
+      "mtd3: 00040000 00010000 \"flash0\"\n"
+      "mtd4: 00040000 00010000 \"flash1\"\n"
+      "mtd5: 00040000 00010000 \"flash1.rootfs\"\n"
+      "mtd6: 00040000 00010000 \"NOR0x\"\n"
+      "mtd7: 00040000 00010000 \"NOR0.BOOT.FSBL\"\n"
+      "mtd10: 00001000 00010000 \"other name\"\n");
+  FlashInterface& flash = Flash();
+  EXPECT_STREQ(flash.mtdNames[0], "NOR0....");
+  EXPECT_STREQ(flash.mtdNames[1], "NAND0...");
+  EXPECT_STREQ(flash.mtdNames[2], "NOR0.kernel");
+  EXPECT_STREQ(flash.mtdNames[3], "NOR0....");
+  EXPECT_STREQ(flash.mtdNames[4], "NAND0...");
+  EXPECT_STREQ(flash.mtdNames[5], "NAND0.rootfs");
+  EXPECT_STREQ(flash.mtdNames[6], "NOR0....");
+  EXPECT_STREQ(flash.mtdNames[7], "NOR0.BOOT.FSBL");
+  // The name ends at the first blank; the closing quote is not there to trim.
+  EXPECT_STREQ(flash.mtdNames[10], "othe");
+  EXPECT_EQ(flash.mtdSizes[10], 0x1000UL);
+  EXPECT_EQ(flash.mtdCount, 11);
+}
+
+TEST_F(PartitionTableTest, CountFollowsTheLastLineAndHighNumbersAreIgnored) {
+  sim_.SetProcMtd(
+      "header\n"
+      "mtd12: 00002000 00010000 \"flash0.A\"\n"
+      "mtd30: 00002000 00010000 \"flash0.B\"\n"
+      "mtd7: 00003000 00010000 \"flash0.C\"\n");
+  FlashInterface& flash = Flash();
+  EXPECT_EQ(flash.mtdCount, 8);
+  EXPECT_STREQ(flash.mtdNames[12], "NOR0.A");
+  EXPECT_STREQ(flash.mtdNames[7], "NOR0.C");
+  EXPECT_EQ(flash.mtdSizes[7], 0x3000UL);
+  for (const auto& name : flash.mtdNames)
+    EXPECT_EQ(std::strstr(name, ".B"), nullptr);
+}
+
+TEST_F(PartitionTableTest, DefaultsAndMeasuredSizes) {
+  LogCapture log;
+  FlashInterface& flash = Flash();
+  EXPECT_EQ(flash.norSectorSize, kNorSector);
+  EXPECT_EQ(flash.nandSectorSize, kNandBlock);
+  EXPECT_EQ(flash.nandPageSize, kNandPage);
+  EXPECT_EQ(flash.emmcChunkSize, 0x80000UL);
+  EXPECT_EQ(flash.spareSectorSize, 0x20000UL);
+  EXPECT_EQ(flash.aliasCount, 0);
+  EXPECT_NE(flash.nandPageBuffer, nullptr);
+  EXPECT_EQ(flash.GetNORSectorSize(), kNorSector);
+  EXPECT_EQ(flash.GetNORChipSize(), 0x400000UL);
+  EXPECT_TRUE(log.Contains("NOR sector size = 0x00010000\r\n"));
+  EXPECT_TRUE(log.Contains("NAND sector size = 0x00020000\r\n"));
+  EXPECT_TRUE(log.Contains("mtdNames[8] = [NOR0....]\r\n"));
+  EXPECT_TRUE(log.Contains("mtd = [flash0\"]\r\n"));
+  for (const auto& message : log.messages()) {
+    EXPECT_EQ(message.module, eLogModuleFlashAccess);
+    EXPECT_EQ(message.sourceFile, "../FlashInterface");
+  }
+  EXPECT_EQ(sim_.OpenCount(), 0);
+}
+
+TEST_F(PartitionTableTest, NoProcMtdLeavesTheTableEmptyAndDefaultsStand) {
+  sim_.RemoveProcMtd();
+  LogCapture log;
+  FlashInterface& flash = Flash();
+  EXPECT_EQ(flash.mtdCount, 0);
+  EXPECT_EQ(flash.norSectorSize, 0x20000UL);
+  EXPECT_EQ(flash.nandSectorSize, 0x80000UL);
+  EXPECT_TRUE(log.Contains(
+      "FlashInterface::FlashInterface: Can't open any partition in NAND0, unable to get sector "
+      "size\r\n"));
+  EXPECT_NE(flash.nandPageBuffer, nullptr);
+}
+
+TEST_F(PartitionTableTest, WithoutNandDeviceThereIsNoNandGeometry) {
+  ASSERT_TRUE(LoadMap(
+      "[device NOR0]\ntechnology = SPI_NOR\nbase = 0xE0000000\nsize = 0x400000\n"));
+  FlashInterface& flash = Flash();
+  EXPECT_EQ(flash.nandSectorSize, 0UL);
+  EXPECT_EQ(flash.nandPageBuffer, nullptr);
+  unsigned long physical = 0;
+  EXPECT_FALSE(flash.ValidBlockOffset(kNandData, 0, physical));
+  unsigned char byte = 0;
+  EXPECT_FALSE(flash.NANDWrite(&byte, 1, "NAND0.SYS.DATA", 0));
+}
+
+TEST_F(PartitionTableTest, NorOpenFailureIsReportedAndDefaultKept) {
+  sim_.FailCall(SimCall::kOpen, 1, EACCES);
+  LogCapture log;
+  FlashInterface& flash = Flash();
+  EXPECT_EQ(flash.norSectorSize, 0x20000UL);
+  EXPECT_TRUE(log.Contains(
+      "FlashInterface::FlashInterface: can't open /dev/mtd8, unable to get NOR sector size\r\n"));
+}
+
+TEST_F(PartitionTableTest, NandDescriptorZeroCountsAsNotOpened) {
+  sim_.SetFirstDescriptor(0);
+  // The NOR measurement takes descriptor 0 and gives it back; the NAND one
+  // then gets 0 again and moves on to the next slot (descriptor 0 again).
+  LogCapture log;
+  FlashInterface& flash = Flash();
+  EXPECT_EQ(flash.norSectorSize, kNorSector);
+  EXPECT_EQ(flash.nandSectorSize, 0x80000UL);
+  EXPECT_TRUE(log.Contains(
+      "FlashInterface::FlashInterface: Can't open any partition in NAND0, unable to get sector "
+      "size\r\n"));
+}
+
+TEST_F(PartitionTableTest, LookupByNameSearchesEveryRowAndLeavesOffset) {
+  FlashInterface& flash = Flash();
+  unsigned long offset = 0x55;
+  EXPECT_STREQ(flash.LookupMTDPartition("NAND0.SYS.SPARE", &offset), "/dev/mtd3");
+  EXPECT_EQ(offset, 0x55UL);
+  EXPECT_EQ(flash.LookupMTDPartition("NAND0.SYS.NONE", &offset), nullptr);
+  EXPECT_EQ(offset, 0x55UL);
+  Location location = MakeLocation("NOR0", "BOOT", "CONFIG");
+  EXPECT_STREQ(flash.LookupMTDPartition(&location, &offset), "/dev/mtd1");
+  // Rows past mtdCount are searched too.
+  std::strcpy(flash.mtdNames[29], "LATE.ROW.X");
+  EXPECT_STREQ(flash.LookupMTDPartition("LATE.ROW.X", &offset), "/dev/mtd29");
+}
+
+TEST_F(PartitionTableTest, UpgradeModeResolvesSlotsToWholeDevices) {
+  FlashInterface& flash = Flash();
+  isRDLQUpgradeInProgress = true;
+  LogCapture log;
+  unsigned long offset = 0x10;
+  EXPECT_STREQ(flash.LookupMTDPartition("NAND0.SYS.SPARE", &offset), "/dev/mtd9");
+  EXPECT_EQ(offset, 0x100010UL);
+  offset = 0;
+  EXPECT_STREQ(flash.LookupMTDPartition("NOR0.BOOT.CONFIG", &offset), "/dev/mtd8");
+  EXPECT_EQ(offset, 0x40000UL);
+  EXPECT_EQ(flash.LookupMTDPartition("NAND0.SYS.NONE", &offset), nullptr);
+  EXPECT_TRUE(log.Contains(
+      "FlashInterface::LookupMTDPartition: GetLocation failed for NAND0.SYS.NONE\r\n"));
+  EXPECT_EQ(flash.LookupMTDPartition("EMMC0.APP.STORE", &offset), nullptr);
+  EXPECT_TRUE(log.Contains("FlashInterface::LookupMTDPartition: unknown device type\r\n"));
+  std::memset(flash.mtdNames[9], 0, sizeof flash.mtdNames[9]);
+  EXPECT_EQ(flash.LookupMTDPartition("NAND0.SYS.DATA", &offset), nullptr);
+  EXPECT_TRUE(log.Contains("FlashInterface::LookupMTDPartition: did not find mtd entry\r\n"));
+  // The address lookup takes the fixed mapping during an upgrade.
+  EXPECT_STREQ(flash.LookupMTDPartition(kNorBase + 0x1234, &offset), "/dev/mtd8");
+  EXPECT_EQ(offset, 0x1234UL);
+}
+
+TEST_F(PartitionTableTest, AddressLookupUsesTheMemoryMapThenTheTableWalk) {
+  FlashInterface& flash = Flash();
+  unsigned long offset = 0;
+  EXPECT_STREQ(flash.LookupMTDPartition(kNorBase + 0x40010, &offset), "/dev/mtd1");
+  EXPECT_EQ(offset, 0x10UL);
+  // No slot holds this address: the walk over the table finds mtd0.
+  EXPECT_STREQ(flash.LookupMTDPartition(kNorBase + 0x30004, &offset), "/dev/mtd0");
+  EXPECT_EQ(offset, 0x30004UL);
+  // Below the chip nothing matches; the walk stops at the first NAND row.
+  EXPECT_EQ(flash.LookupMTDPartition(kNorBase - 1, &offset), nullptr);
+  EXPECT_EQ(flash.LookupMTDPartition(kNorBase + 0x100000, &offset), nullptr);
+}
+
+TEST_F(PartitionTableTest, AddressLookupBeforeTheMapIsLoadedIsFixed) {
+  ExtendedMemoryMapStructure::Reset();
+  FlashInterface& flash = Flash();
+  unsigned long offset = 0;
+  EXPECT_STREQ(flash.LookupMTDPartition(kNorBase + 0x40010, &offset), "/dev/mtd8");
+  EXPECT_EQ(offset, 0x40010UL);
+}
+
+}  // namespace
+}  // namespace test
+}  // namespace stbplat

@@ -1,0 +1,161 @@
+// An in-process stand-in for the device's flash, bound through the OS seam:
+// /proc/mtd, MTD character nodes with the kernel's rules (MEMGETINFO,
+// MEMERASE, ECCGETSTATS, MEMGETBADBLOCK, MEMSETBADBLOCK), eMMC block nodes,
+// plain files (slot files), and /dev/mem over fake physical regions. FILE*
+// streams (fopen64) are real FILE objects made with fopencookie.
+//
+// MTD rules, as the kernel applies them:
+// - NOR: any offset and length; programming only clears bits (the caller
+//   erases first); erase sets 0xFF; no bad blocks (MEMSETBADBLOCK is
+//   refused with EOPNOTSUPP, MEMGETBADBLOCK answers 0).
+// - NAND: writes start on a page and are whole pages (EINVAL otherwise),
+//   only into erased pages, never into a bad block (EIO); erases are
+//   block-aligned (EINVAL) and fail on a bad block (EIO); reads of a range
+//   with an injected ECC failure succeed with the data and raise the failed
+//   counter of ECCGETSTATS, as the kernel does.
+// - erased bytes read 0xFF; seeking or erasing past the end is EINVAL; a
+//   read at the end returns 0 bytes.
+//
+// The bytes of each node live behind SimStorage, so a file-backed store can
+// replace the in-memory one without touching the node rules.
+#ifndef STBPLAT_TESTS_SUPPORT_FLASH_SIM_H
+#define STBPLAT_TESTS_SUPPORT_FLASH_SIM_H
+
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "os/seam.h"
+
+namespace stbplat {
+namespace test {
+
+// The bytes of one node. Offsets and lengths are checked by the caller.
+class SimStorage {
+ public:
+  virtual ~SimStorage() = default;
+  virtual uint64_t Size() const = 0;
+  virtual void Read(uint64_t offset, void* buffer, size_t length) const = 0;
+  virtual void Write(uint64_t offset, const void* data, size_t length) = 0;
+  // Regular files grow; devices never call this.
+  virtual void Resize(uint64_t size) = 0;
+};
+
+std::unique_ptr<SimStorage> MakeMemoryStorage(uint64_t size, uint8_t fill);
+
+enum class SimKind { kNor, kNand, kEmmc, kFile };
+
+// Seam calls that faults can be attached to. kIoctl matches every request;
+// the MTD requests can also be chosen one by one. kAny matches every call.
+enum class SimCall {
+  kAny, kOpen, kClose, kLseek, kRead, kWrite, kIoctl, kMemGetInfo, kMemErase, kEccGetStats,
+  kMemGetBadBlock, kMemSetBadBlock, kFopen, kFclose, kFread, kFwrite, kFseek, kFgets, kMmap,
+  kUnlink,
+};
+
+class FlashSim {
+ public:
+  // Binds itself through the seam for its lifetime.
+  FlashSim();
+  ~FlashSim();
+  FlashSim(const FlashSim&) = delete;
+  FlashSim& operator=(const FlashSim&) = delete;
+
+  // /dev/mtdN and its /proc/mtd line ("mtdN: size erasesize \"name\"").
+  void AddMtd(int number, const std::string& name, SimKind kind, uint64_t size,
+              uint32_t eraseSize, uint32_t writeSize = 1);
+  // Replaces the generated /proc/mtd text; "" with remove=true drops it.
+  void SetProcMtd(const std::string& text);
+  void RemoveProcMtd();
+  void AddEmmc(const std::string& path, uint64_t size);
+  // Makes alias reach the node at target (an MTD node over the eMMC device).
+  void Alias(const std::string& alias, const std::string& target);
+  void AddFile(const std::string& path, const std::vector<uint8_t>& contents);
+  bool HasFile(const std::string& path) const;
+  // Physical memory seen through /dev/mem.
+  void AddMemory(uint64_t physBase, uint64_t size);
+  uint8_t* Memory(uint64_t physAddress);
+
+  // Direct access to a node's bytes (no rules applied).
+  std::vector<uint8_t> Bytes(const std::string& path, uint64_t offset, size_t length) const;
+  void Poke(const std::string& path, uint64_t offset, const std::vector<uint8_t>& data);
+  void MarkBad(const std::string& path, uint64_t offset);
+  bool IsBad(const std::string& path, uint64_t offset) const;
+  // A read covering offset counts one uncorrectable ECC failure.
+  void AddEccFailure(const std::string& path, uint64_t offset);
+  // Writes covering offset fail with EIO (a weak page) until cleared.
+  void FailWritesAt(const std::string& path, uint64_t offset);
+  void ClearWriteFailures();
+
+  // Fails the nth matching call (1 = the next one), with errno = error;
+  // persistent: that one and every later one.
+  void FailCall(SimCall call, int nth, int error, bool persistent = false);
+  void ClearFaults();
+  int CallCount(SimCall call) const;
+  // Writes (write and MEMERASE) reaching a node, as (offset, length) pairs.
+  const std::vector<std::pair<uint64_t, uint64_t>>& Writes(const std::string& path) const;
+  const std::vector<std::pair<uint64_t, uint64_t>>& Erases(const std::string& path) const;
+  void ClearHistory();
+
+  // Descriptors and FILE streams currently open.
+  int OpenCount() const;
+  void SetPageSize(int size) { pageSize_ = size; }
+  int PageSize() const { return pageSize_; }
+  // Descriptors are the lowest free number from this one on, as the kernel
+  // hands them out (0 lets a test see a descriptor 0).
+  void SetFirstDescriptor(int fd) { firstFd_ = fd; }
+
+  struct Node;
+  struct Handle;
+  struct Fault;
+
+  // Entry points of the bound seam table (public for the table only).
+  static FlashSim* Current();
+  bool Hit(SimCall call, SimCall specific = SimCall::kAny);
+  Node* Find(const std::string& path);
+  const Node* Find(const std::string& path) const;
+  Node* Create(const std::string& path, SimKind kind, uint64_t size);
+  int Open(const char* path, int flags);
+  int Close(int fd);
+  off64_t Seek(int fd, off64_t offset, int whence);
+  ssize_t Read(int fd, void* buffer, size_t count);
+  ssize_t Write(int fd, const void* data, size_t count);
+  int Ioctl(int fd, unsigned long request, void* argument);
+  void* Map(size_t length, int fd, off64_t offset);
+  int Unlink(const char* path);
+  // Node-level transfers shared by descriptors and FILE streams; 0 or an
+  // errno value, *done = bytes moved.
+  int NodeRead(Node& node, uint64_t offset, void* buffer, size_t count, size_t* done);
+  int NodeWrite(Node& node, uint64_t offset, const void* data, size_t count, size_t* done);
+  void FileOpened(int delta) { openFiles_ += delta; }
+  std::string ProcMtdText() const;
+
+ private:
+  os::SysCalls table_;
+  std::unique_ptr<os::ScopedSysCalls> binding_;
+  std::map<std::string, std::shared_ptr<Node>> nodes_;
+  std::map<int, std::unique_ptr<Handle>> handles_;
+  std::vector<std::unique_ptr<Fault>> faults_;
+  std::map<SimCall, int> counts_;
+  std::map<int, std::string> procLines_;
+  std::string procOverride_;
+  bool hasOverride_ = false;
+  bool procRemoved_ = false;
+  struct Region {
+    uint64_t base;
+    std::vector<uint8_t> bytes;
+  };
+  std::vector<Region> memory_;
+  int firstFd_ = 3;
+  int openFiles_ = 0;
+  int pageSize_ = 4096;
+  FlashSim* previous_;
+};
+
+}  // namespace test
+}  // namespace stbplat
+
+#endif
