@@ -40,12 +40,7 @@ Bytes Devc(unsigned short clock) {
 }
 
 TEST(FSBLInfo, ConstructsWithTheChosenTypeAndVersions) {
-  FSBLInfo info;
-  EXPECT_EQ(info.entryType, 0x4653424Cu);
-  EXPECT_EQ(info.majorVer, 0);
-  EXPECT_EQ(info.deviceConfig.entryType, 0x44455643u);
-  EXPECT_EQ(info.memConfig.entryType, 0x4D434647u);
-  EXPECT_EQ(info.BseckInfo.entryType, 0x4253434Bu);
+  EXPECT_EQ(FSBLInfo().majorVer, 0);
   FSBLInfo other(0x41424344, 1, 2, 3);
   EXPECT_EQ(other.entryType, 0x41424344u);
   EXPECT_EQ(other.flags, 1);
@@ -116,31 +111,24 @@ TEST(FSBLInfo, PaddingOfTwelveBetweenKnownEntriesIsSkippedSilently) {
   EXPECT_TRUE(RecordTexts(capture).empty());
 }
 
-TEST(FSBLInfo, FailingMemberIsANestedFailure) {
+TEST(FSBLInfo, EachFailingMemberIsANestedFailureWithItsMessage) {
   Bytes devc = Devc(7);
   devc[10] = 1;  // major version 1: newer than the member accepts
-  Bytes bytes = FsblEntry(1, devc);
-  Extruder in(bytes.data(), static_cast<unsigned int>(bytes.size()));
-  FSBLInfo info;
-  LogCapture capture;
-  EXPECT_EQ(info.ReadTLVAndData(in, nullptr), 0xA004u);
-  EXPECT_FALSE(info.valid);
-  EXPECT_EQ(RecordTexts(capture).back(), "Error reading deviceConfig\r\n");
-  EXPECT_EQ(in.bytesLeft, 0u);
-}
-
-TEST(FSBLInfo, EachMemberHasItsFailureMessage) {
   const struct {
-    const char* type;
+    Bytes nested;
     const char* message;
-  } cases[] = {{"MCFG", "Error reading memConfig\r\n"}, {"BSCK", "Error reading BseckInfo\r\n"}};
+  } cases[] = {{devc, "Error reading deviceConfig\r\n"},
+               {Entry("MCFG", {}), "Error reading memConfig\r\n"},  // payload missing
+               {Entry("BSCK", {}), "Error reading BseckInfo\r\n"}};
   for (const auto& c : cases) {
-    Bytes bytes = FsblEntry(1, Entry(c.type, {}));  // payload missing
+    Bytes bytes = FsblEntry(1, c.nested);
     Extruder in(bytes.data(), static_cast<unsigned int>(bytes.size()));
     FSBLInfo info;
     LogCapture capture;
     EXPECT_EQ(info.ReadTLVAndData(in, nullptr), 0xA004u);
+    EXPECT_FALSE(info.valid);
     EXPECT_EQ(RecordTexts(capture).back(), c.message);
+    EXPECT_EQ(in.bytesLeft, 0u);
   }
 }
 

@@ -21,10 +21,7 @@ TEST(FrontPanel, GoldenRecordReadsAndStoresBack) {
   ASSERT_EQ(e.text.length, 6u);
   EXPECT_STREQ(reinterpret_cast<const char*>(e.text.GetData()), "HELLO");
 
-  Bytes buffer(golden.size());
-  Intruder out(buffer.data(), static_cast<unsigned int>(buffer.size()));
-  EXPECT_EQ(e.StoreTLVAndData(&out), 0u);
-  EXPECT_EQ(Written(out), golden);
+  EXPECT_EQ(Stored(e, golden.size()), golden);
 }
 
 TEST(FrontPanel, MajorVersionOneIsRefused) {

@@ -32,16 +32,14 @@ TEST(Location, NamesTakeTheStandardForm) {
   EXPECT_EQ(Name(longName.deviceName), "SPI_NOR.");
   EXPECT_EQ(Name(longName.partitionName), "BOOTLOAD") << "cut to 8, no padding";
   EXPECT_EQ(longName.GetNameString(), "SPI_NOR.BOOTLOAD.X");
-}
-
-TEST(Location, DefaultIsAllZeroAndItsNameStringKeepsTheNuls) {
+  // The default is all zero and its name string keeps the NULs.
   Location empty;
   EXPECT_EQ(Name(empty.deviceName), std::string(8, '\0'));
   std::string expected = std::string(8, '\0') + "." + std::string(8, '\0') + "." + std::string(8, '\0');
   EXPECT_EQ(empty.GetNameString(), expected);
 }
 
-TEST(Location, CopiesPassThroughTheStandardFormAgain) {
+TEST(Location, CopiesPassThroughTheStandardFormAgainAndCompareBytes) {
   Location raw;
   std::memcpy(raw.deviceName, "ab\0dEFGH", 8);
   std::memcpy(raw.partitionName, "PART....", 8);
@@ -52,9 +50,6 @@ TEST(Location, CopiesPassThroughTheStandardFormAgain) {
   Location assigned;
   assigned = raw;
   EXPECT_EQ(Name(assigned.deviceName), "AB......");
-}
-
-TEST(Location, EqualityIsThePlatformsByteComparison) {
   EXPECT_TRUE(Location(U("nor0"), U("boot"), U("a")) == Location(U("NOR0"), U("BOOT"), U("A")));
   EXPECT_FALSE(Location(U("nor0"), U("boot"), U("a")) == Location(U("NOR0"), U("BOOT"), U("B")));
 }

@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+#include <gtest/gtest.h>
+
 #include "stbplat/extruder.h"
 #include "stbplat/intruder.h"
 #include "support/log_capture.h"
@@ -23,6 +25,15 @@ inline Bytes Golden(const std::string& name) {
 
 inline Bytes Written(const Intruder& out) {
   return Bytes(out.pStart, out.pStart + (out.pCurrent - out.pStart));
+}
+
+// What `record` stores into a buffer of `size` bytes.
+template <class Record>
+Bytes Stored(const Record& record, size_t size) {
+  Bytes buffer(size);
+  Intruder out(buffer.data(), static_cast<unsigned int>(size));
+  EXPECT_EQ(record.StoreTLVAndData(&out), 0u);
+  return Written(out);
 }
 
 inline unsigned long Offset(const Extruder& in) {

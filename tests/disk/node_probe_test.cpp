@@ -31,21 +31,16 @@ std::vector<std::string> SysBlock(const std::vector<std::string>& names) {
   return paths;
 }
 
-TEST(HardDriveProbeSataPosition, CountsTheListedDevices) {
+TEST(HardDriveProbeSataPosition, CountsTheListedDevicesLongLinesOnce) {
   FakeSystem sys;
   sys.AddFile("/proc/scsi/scsi", kTwoDevices);
   HardDriveNodeInfo drive{};
   drive.scsiDeviceCount = 9;
   EXPECT_EQ(HardDriveProbeSataPosition(&drive), 1);
   EXPECT_EQ(drive.scsiDeviceCount, 2u);
-}
-
-TEST(HardDriveProbeSataPosition, LongLinesCountOnce) {
-  FakeSystem sys;
   // The 255-character reads of the first entry's line end right before "Host: scsi9".
   sys.AddFile("/proc/scsi/scsi", "Attached devices:\nHost: scsi0 " + std::string(243, 'x') +
                                      "Host: scsi9\nHost: scsi1 Channel: 00\n");
-  HardDriveNodeInfo drive{};
   EXPECT_EQ(HardDriveProbeSataPosition(&drive), 1);
   EXPECT_EQ(drive.scsiDeviceCount, 2u);
 }
@@ -108,19 +103,6 @@ TEST(HardDriveProbeNodePosition, ScansEveryNodeWithoutTheList) {
   EXPECT_EQ(drive.deviceNode, 4);
   EXPECT_EQ(drive.scsiBus, HARD_DRIVE_BUS_UNKNOWN);
   EXPECT_EQ(drive.reserved[0], 0);
-}
-
-TEST(HardDriveProbeNodePosition, WithTheList) {
-  FakeSystem sys;
-  sys.AddFile("/proc/scsi/scsi", kTwoDevices);
-  sys.AddBlockLink("sda", kAtaLink);
-  HardDriveNodeInfo drive{};
-  testing::internal::CaptureStdout();
-  EXPECT_EQ(HardDriveProbeNodePosition(&drive), 1);
-  testing::internal::GetCapturedStdout();
-  EXPECT_EQ(drive.scsiDeviceCount, 2u);
-  EXPECT_EQ(drive.deviceNode, 0);
-  EXPECT_EQ(drive.scsiBus, 0u);
 }
 
 TEST(HardDriveProbeNodePosition, NothingFound) {

@@ -23,43 +23,21 @@ using stbplat::test::kAtaLink;
 using stbplat::test::kUsbLink;
 using stbplat::test::LogCapture;
 
+// Shortened outputs of `hdparm -i` and `smartctl -A`; the decoy lines hold
+// the words the probes grep for in other columns.
 std::string HdparmIdentity(const std::string& device, const std::string& modelLine) {
   return "\n" + device + ":\n\n " + modelLine +
-         "\n"
-         " Config={ HardSect NotMFM HdSw>15uSec Fixed DTR>10Mbs RotSpdTol>.5% }\n"
-         " RawCHS=16383/16/63, TrkSize=0, SectSize=0, ECCbytes=4\n"
-         " BuffType=unknown, BuffSize=64kB, MaxMultSect=16, MultSect=off\n"
-         " CurCHS=16383/16/63, CurSects=16514064, LBA=yes, LBAsects=3907029168\n"
-         " IORDY=on/off, tPIO={min:120,w/IORDY:120}, tDMA={min:120,rec:120}\n"
-         " PIO modes:  pio0 pio1 pio2 pio3 pio4 \n"
-         " DMA modes:  mdma0 mdma1 mdma2 \n"
-         " UDMA modes: udma0 udma1 udma2 udma3 udma4 udma5 *udma6 \n"
-         " AdvancedPM=yes: unknown setting WriteCache=enabled\n"
-         " Drive conforms to: unknown:  ATA/ATAPI-4,5,6,7\n"
-         "\n"
-         " * signifies the current active mode\n\n";
+         "\n Config={ HardSect NotMFM HdSw>15uSec Fixed DTR>10Mbs RotSpdTol>.5% }\n"
+         " UDMA modes: udma0 udma1 udma2 udma3 udma4 udma5 *udma6 \n\n";
 }
 
 std::string SmartctlAttributes(const std::string& temperatureLine) {
-  return "smartctl 7.3 2022-02-28 r5338 [x86_64-linux-6.1.0-18-amd64] (local build)\n"
-         "Copyright (C) 2002-22, Bruce Allen, Christian Franke, www.smartmontools.org\n"
-         "\n"
-         "=== START OF READ SMART DATA SECTION ===\n"
-         "SMART Attributes Data Structure revision number: 10\n"
-         "Vendor Specific SMART Attributes with Thresholds:\n"
+  return "smartctl 7.3 2022-02-28 r5338 [x86_64-linux-6.1.0-18-amd64] (local build)\n\n"
          "ID# ATTRIBUTE_NAME          FLAG     VALUE WORST THRESH TYPE      UPDATED  "
          "WHEN_FAILED RAW_VALUE\n"
-         "  1 Raw_Read_Error_Rate     0x000f   117   099   006    Pre-fail  Always       -"
-         "       148579464\n"
-         "  9 Power_On_Hours          0x0032   072   072   000    Old_age   Always       -"
-         "       24601\n"
          "190 Airflow_Temperature_Cel 0x0022   064   047   045    Old_age   Always       -"
          "       36 (Min/Max 18/53)\n" +
-         temperatureLine +
-         "\n"
-         "197 Current_Pending_Sector  0x0012   100   100   000    Old_age   Always       -"
-         "       0\n"
-         "\n";
+         temperatureLine + "\n\n";
 }
 
 struct Drive {
@@ -150,30 +128,20 @@ HardDriveNodeInfo Node(unsigned char node) {
 }
 
 TEST_F(ShellTools, VendorFromHdparmIdentity) {
-  for (const Drive* d : {&kSeagate, &kWesternDigital, &kHitachi, &kToshiba}) {
-    SCOPED_TRACE(d->name);
+  const std::pair<std::string, unsigned int> models[] = {
+      {kSeagate.modelLine, 0}, {kWesternDigital.modelLine, 1}, {kHitachi.modelLine, 2},
+      {kToshiba.modelLine, 3}, {"MODEL=wdc wd5000aakx-00erma0, FwRev=15.01H15", 1}};
+  for (const auto& m : models) {
+    SCOPED_TRACE(m.first);
     FakeSystem sys;
     sys.UseRealPipes(true);
-    Install(*d, "/dev/sdb");
+    Prints("hdparm", HdparmIdentity("/dev/sdb", m.first));
     HardDriveNodeInfo drive = Node(1);
     unsigned int vendor = 99;
     EXPECT_EQ(HardDriveGetVendorType(&drive, &vendor), 1);
-    EXPECT_EQ(vendor, d->vendor);
+    EXPECT_EQ(vendor, m.second);
   }
-  EXPECT_EQ(Calls("hdparm"), (std::vector<std::string>{"-i /dev/sdb", "-i /dev/sdb", "-i /dev/sdb",
-                                                       "-i /dev/sdb", "-i /dev/sdb", "-i /dev/sdb",
-                                                       "-i /dev/sdb", "-i /dev/sdb", "-i /dev/sdb",
-                                                       "-i /dev/sdb"}));
-}
-
-TEST_F(ShellTools, VendorPatternIgnoresCase) {
-  FakeSystem sys;
-  sys.UseRealPipes(true);
-  Prints("hdparm", HdparmIdentity("/dev/sda", "MODEL=wdc wd5000aakx-00erma0, FwRev=15.01H15"));
-  HardDriveNodeInfo drive = Node(0);
-  unsigned int vendor = 99;
-  EXPECT_EQ(HardDriveGetVendorType(&drive, &vendor), 1);
-  EXPECT_EQ(vendor, 1u);
+  EXPECT_EQ(Calls("hdparm"), std::vector<std::string>(1 + 2 + 3 + 4 + 2, "-i /dev/sdb"));
 }
 
 TEST_F(ShellTools, SilentHdparmMeansNoVendor) {

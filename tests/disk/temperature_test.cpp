@@ -110,40 +110,6 @@ TEST(HardDriveGetTemperatureData, ScanAndPipeFailures) {
   }
 }
 
-struct VendorCase {
-  const char* pattern;
-  std::vector<std::pair<int, std::string>> columns;
-  std::vector<int> columnsRead;
-  unsigned int current;
-  unsigned int highest;
-};
-
-TEST(HardDriveGetTemperature, EachVendorReadsItsColumns) {
-  const std::vector<VendorCase> cases = {
-      {"Model=ST", {{5, "053\n"}, {10, "36\n"}}, {5, 10}, 36, 53},
-      {"Model=WD", {{4, "100\n"}, {5, "098\n"}, {10, "40\n"}}, {4, 5, 10}, 40, 42},
-      {"Model=Hi", {{12, "21/47)\n"}, {10, "35\n"}}, {12, 10}, 35, 47},
-      {"Model=To", {{12, "15/52)\n"}, {10, "38\n"}}, {12, 10}, 38, 52},
-  };
-  for (const VendorCase& c : cases) {
-    SCOPED_TRACE(c.pattern);
-    FakeSystem sys;
-    Vendor(sys, c.pattern);
-    for (const auto& column : c.columns) Column(sys, column.first, column.second);
-    HardDriveNodeInfo drive = Drive(3);
-    unsigned int pair[2] = {1, 1};
-    EXPECT_TRUE(HardDriveGetTemperature(&drive, pair));
-    EXPECT_EQ(pair[0], c.current);
-    EXPECT_EQ(pair[1], c.highest);
-    std::vector<std::string> smartctl;
-    for (const std::string& command : sys.commands())
-      if (command.rfind("smartctl", 0) == 0) smartctl.push_back(command);
-    std::vector<std::string> expected;
-    for (int column : c.columnsRead) expected.push_back(Smartctl("/dev/sdd", column));
-    EXPECT_EQ(smartctl, expected);
-  }
-}
-
 TEST(HardDriveGetTemperature, WesternDigitalDifferenceWrapsInThirtyTwoBits) {
   FakeSystem sys;
   Vendor(sys, "Model=WD");

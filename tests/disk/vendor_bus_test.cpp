@@ -21,10 +21,6 @@ HardDriveNodeInfo Drive(unsigned char node) {
   return drive;
 }
 
-std::string Grep(const char* device, const char* pattern) {
-  return std::string("hdparm -i ") + device + " 2>/dev/null | grep -i -c " + pattern;
-}
-
 void ExpectTraces(const LogCapture& log, const std::vector<std::string>& texts) {
   EXPECT_EQ(log.texts(), texts);
   for (const auto& m : log.messages()) {
@@ -32,47 +28,6 @@ void ExpectTraces(const LogCapture& log, const std::vector<std::string>& texts) 
     EXPECT_EQ(m.level, 6u);
     EXPECT_EQ(m.sourceFile, "HardDriveTempUtils");
   }
-}
-
-TEST(HardDriveGetVendorType, FirstMatchingPatternGivesTheVendor) {
-  FakeSystem sys;
-  sys.SetPipeOutput("Model=WD", "1\n");
-  sys.SetPipeOutput("Model=", "0\n");
-  LogCapture log;
-  HardDriveNodeInfo drive = Drive(2);
-  unsigned int vendor = 99;
-  EXPECT_EQ(HardDriveGetVendorType(&drive, &vendor), 1);
-  EXPECT_EQ(vendor, 1u);
-  EXPECT_EQ(sys.commands(), (std::vector<std::string>{Grep("/dev/sdc", "Model=ST"),
-                                                      Grep("/dev/sdc", "Model=WD")}));
-  EXPECT_TRUE(log.messages().empty());
-}
-
-TEST(HardDriveGetVendorType, FourMissesMeanNoVendor) {
-  FakeSystem sys;
-  sys.SetPipeOutput("Model=", "0\n");
-  LogCapture log;
-  HardDriveNodeInfo drive = Drive(4);
-  unsigned int vendor = 0;
-  EXPECT_EQ(HardDriveGetVendorType(&drive, &vendor), 0);
-  EXPECT_EQ(vendor, 4u);
-  ASSERT_EQ(sys.commands().size(), 4u);
-  EXPECT_EQ(sys.commands()[2], Grep("/dev/sde", "Model=Hi"));
-  EXPECT_EQ(sys.commands()[3], Grep("/dev/sde", "Model=To"));
-  ExpectTraces(log, {"\n\r[ErrorMsg] [HardDriveGetVendorType] Hard Drive Vendor Not Found\n\r"});
-  EXPECT_EQ(log.messages()[0].function, "HardDriveGetVendorType");
-}
-
-TEST(HardDriveGetVendorType, WrongNodeNumberRunsNothing) {
-  FakeSystem sys;
-  LogCapture log;
-  HardDriveNodeInfo drive = Drive(5);
-  unsigned int vendor = 0;
-  EXPECT_EQ(HardDriveGetVendorType(&drive, &vendor), 0);
-  EXPECT_EQ(vendor, 4u);
-  EXPECT_TRUE(sys.commands().empty());
-  ExpectTraces(log, {"\n\r[ErrorMsg] [HardDriveGetVendorType] Failed To Input Wrong Device Node "
-                     "Number (5)\n\r"});
 }
 
 TEST(HardDriveGetVendorType, PipeFailures) {

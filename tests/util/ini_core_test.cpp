@@ -5,7 +5,9 @@
 #include <gtest/gtest.h>
 
 #include <cstdio>
+#include <set>
 #include <string>
+#include <vector>
 
 #include "support/ini_recorder.h"
 
@@ -16,150 +18,92 @@ using stbplat::test::IniRecorder;
 using stbplat::test::TempTextFile;
 namespace ini = stbplat::ini;
 
-struct ParseOutcome {
-  int result;
-  std::string output;  // standard output during the parse
-};
-
-ParseOutcome ParseText(const std::string& text, IniRecorder& recorder, bool withDirectives = true,
-                       const char* name = "test.ini") {
+// Returns the parse result; `output` receives what went to standard output.
+int ParseText(const std::string& text, IniRecorder& recorder, std::string& output,
+              bool withDirectives = true) {
   TempTextFile file(text);
   FILE* in = std::fopen(file.path().c_str(), "r");
   EXPECT_NE(in, nullptr);
   testing::internal::CaptureStdout();
   int result = ini::IniParseFile(in, ::fgets, IniRecorder::OnValue,
                                  withDirectives ? IniRecorder::OnDirective : nullptr, &recorder,
-                                 name);
-  std::string output = testing::internal::GetCapturedStdout();
+                                 "test.ini");
+  output = testing::internal::GetCapturedStdout();
   std::fclose(in);
-  return {result, output};
+  return result;
 }
 
-TEST(IniCore, InlineCommentNeedsWhitespaceBeforeIt) {
-  IniRecorder r;
-  ParseOutcome out = ParseText("name = value ; note\nother = a;b\nthird = ;x\n", r);
-  EXPECT_EQ(out.result, 0);
-  EXPECT_EQ(out.output, "");
-  ASSERT_EQ(r.entries.size(), 3u);
-  EXPECT_EQ(r.entries[0], (IniEntry{"", "name", "value"}));
-  EXPECT_EQ(r.entries[1], (IniEntry{"", "other", "a;b"}));
-  EXPECT_EQ(r.entries[2], (IniEntry{"", "third", ";x"}));
+struct Case {
+  std::string text;
+  int result;  // 0, or the last bad line that counts
+  std::string output;
+  std::vector<IniEntry> entries;
+  std::set<std::string> refused;
+};
+
+const std::string kNoClose = "ERROR: No closing ']' found on line ";
+const std::string kNoValue = "ERROR: No value found on line ";
+
+TEST(IniCore, LinesSectionsCommentsAndErrors) {
+  const Case cases[] = {
+      // an inline comment needs whitespace before it
+      {"name = value ; note\nother = a;b\nthird = ;x\n", 0, "",
+       {{"", "name", "value"}, {"", "other", "a;b"}, {"", "third", ";x"}}, {}},
+      // ':' separates only where no '=' comes first
+      {"[s]\nkey: value\na:b = c\n", 0, "", {{"s", "key", "value"}, {"s", "a:b", "c"}}, {}},
+      {"top = 1\n[ my section ]\nx=1\n[" + std::string(60, 'S') + "]\ny = 2\n", 0, "",
+       {{"", "top", "1"}, {" my section ", "x", "1"}, {std::string(49, 'S'), "y", "2"}}, {}},
+      {"  name   =   some value  \r\n\t[s]\r\nempty =\r\n", 0, "",
+       {{"", "name", "some value"}, {"s", "empty", ""}}, {}},
+      {"", 0, "", {}, {}},
+      {"; one\n# two\n   ; three\n\n\t\n", 0, "", {}, {}},
+      // a commented ']' leaves the section as it was
+      {"[a]\n[sec ; note]\nk = v\n", 2, kNoClose + "2 in file test.ini: [sec ; note]\r\n",
+       {{"a", "k", "v"}}, {}},
+      // a later bad line replaces the result; bad lines do not stop the parse
+      {"a = 1\nb = 2\n[open\nc = 3\n\n; c\njustaname\nd = 4\n", 7,
+       kNoClose + "3 in file test.ini: [open\r\n" + kNoValue +
+           "7 in file test.ini for parameter justaname\r\n",
+       {{"", "a", "1"}, {"", "b", "2"}, {"", "c", "3"}, {"", "d", "4"}}, {}},
+      // only the first bracket error is printed
+      {"[one\n[two\n", 1, kNoClose + "1 in file test.ini: [one\r\n", {}, {}},
+      // a refused value counts only while no earlier error is kept
+      {"x=1\nbad1 = a\nz=3\n#\nbad2 = b\n", 2, "",
+       {{"", "x", "1"}, {"", "bad1", "a"}, {"", "z", "3"}, {"", "bad2", "b"}}, {"bad1", "bad2"}},
+      {"a ; b = c\n", 1, kNoValue + "1 in file test.ini for parameter a ; b = c\r\n", {}, {}},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.text);
+    IniRecorder r;
+    r.refusedNames = c.refused;
+    std::string output;
+    EXPECT_EQ(ParseText(c.text, r, output), c.result);
+    EXPECT_EQ(output, c.output);
+    EXPECT_EQ(r.entries, c.entries);
+  }
 }
 
-TEST(IniCore, ColonIsTheSecondSeparator) {
-  IniRecorder r;
-  ParseOutcome out = ParseText("[s]\nkey: value\na:b = c\n", r);
-  EXPECT_EQ(out.result, 0);
-  ASSERT_EQ(r.entries.size(), 2u);
-  EXPECT_EQ(r.entries[0], (IniEntry{"s", "key", "value"}));
-  EXPECT_EQ(r.entries[1], (IniEntry{"s", "a:b", "c"}));
-}
-
-TEST(IniCore, SectionsKeepTheirSpacesAndAreCutAt49) {
-  IniRecorder r;
-  std::string longName(60, 'S');
-  ParseOutcome out =
-      ParseText("top = 1\n[ my section ]\nx=1\n[" + longName + "]\ny = 2\n", r);
-  EXPECT_EQ(out.result, 0);
-  ASSERT_EQ(r.entries.size(), 3u);
-  EXPECT_EQ(r.entries[0], (IniEntry{"", "top", "1"}));
-  EXPECT_EQ(r.entries[1], (IniEntry{" my section ", "x", "1"}));
-  EXPECT_EQ(r.entries[2], (IniEntry{std::string(49, 'S'), "y", "2"}));
-}
-
-TEST(IniCore, CommentedClosingBracketIsAnErrorAndKeepsTheSection) {
-  IniRecorder r;
-  ParseOutcome out = ParseText("[a]\n[sec ; note]\nk = v\n", r);
-  EXPECT_EQ(out.result, 2);
-  EXPECT_EQ(out.output, "ERROR: No closing ']' found on line 2 in file test.ini: [sec ; note]\r\n");
-  ASSERT_EQ(r.entries.size(), 1u);
-  EXPECT_EQ(r.entries[0], (IniEntry{"a", "k", "v"}));
-}
-
-TEST(IniCore, MissingSeparatorOverwritesAnEarlierErrorLine) {
-  IniRecorder r;
-  ParseOutcome out = ParseText("a = 1\nb = 2\n[open\nc = 3\n\n; c\njustaname\nd = 4\n", r);
-  EXPECT_EQ(out.result, 7);
-  EXPECT_EQ(out.output,
-            "ERROR: No closing ']' found on line 3 in file test.ini: [open\r\n"
-            "ERROR: No value found on line 7 in file test.ini for parameter justaname\r\n");
-  EXPECT_EQ(r.entries.size(), 4u);  // bad lines do not stop the parse
-}
-
-TEST(IniCore, SecondBracketErrorIsSilent) {
-  IniRecorder r;
-  ParseOutcome out = ParseText("[one\n[two\n", r);
-  EXPECT_EQ(out.result, 1);
-  EXPECT_EQ(out.output, "ERROR: No closing ']' found on line 1 in file test.ini: [one\r\n");
-}
-
-TEST(IniCore, RefusedValuesKeepTheFirstErrorLine) {
-  IniRecorder r;
-  r.refusedNames = {"bad1", "bad2"};
-  ParseOutcome out = ParseText("x=1\ny=2\nbad1 = a\nz=3\n#\n;\nbad2 = b\nw=4\n", r);
-  EXPECT_EQ(out.result, 3);
-  EXPECT_EQ(out.output, "");
-  EXPECT_EQ(r.entries.size(), 6u);
-}
-
-TEST(IniCore, CommentBeforeTheSeparatorLeavesNoValue) {
-  IniRecorder r;
-  ParseOutcome out = ParseText("a ; b = c\n", r);
-  EXPECT_EQ(out.result, 1);
-  EXPECT_EQ(out.output,
-            "ERROR: No value found on line 1 in file test.ini for parameter a ; b = c\r\n");
-  EXPECT_TRUE(r.entries.empty());
-}
-
-TEST(IniCore, WhitespaceAndLineEndsAreTrimmed) {
-  IniRecorder r;
-  ParseOutcome out = ParseText("  name   =   some value  \r\n\t[s]\r\nempty =\r\n", r);
-  EXPECT_EQ(out.result, 0);
-  ASSERT_EQ(r.entries.size(), 2u);
-  EXPECT_EQ(r.entries[0], (IniEntry{"", "name", "some value"}));
-  EXPECT_EQ(r.entries[1], (IniEntry{"s", "empty", ""}));
-}
-
-TEST(IniCore, EmptyAndCommentOnlyFilesAreGood) {
-  IniRecorder r;
-  EXPECT_EQ(ParseText("", r).result, 0);
-  ParseOutcome out = ParseText("; one\n# two\n   ; three\n\n\t\n", r);
-  EXPECT_EQ(out.result, 0);
-  EXPECT_EQ(out.output, "");
-  EXPECT_TRUE(r.entries.empty());
-  EXPECT_TRUE(r.directives.empty());
-}
-
-TEST(IniCore, DirectivesReachTheirHandlerWithTheColon) {
+TEST(IniCore, Directives) {
   IniRecorder r;
   r.acceptDirectives = false;
-  ParseOutcome out = ParseText("a=1\n  :include other.ini  \n:second\n", r);
-  EXPECT_EQ(out.result, 2);
-  ASSERT_EQ(r.directives.size(), 2u);
-  EXPECT_EQ(r.directives[0], ":include other.ini");
-  EXPECT_EQ(r.directives[1], ":second");
-}
-
-TEST(IniCore, DirectivesAreSkippedWithoutAHandler) {
-  IniRecorder r;
-  ParseOutcome out = ParseText(":directive\nk = v\n", r, false);
-  EXPECT_EQ(out.result, 0);
-  ASSERT_EQ(r.entries.size(), 1u);
-  EXPECT_TRUE(r.directives.empty());
+  std::string output;
+  EXPECT_EQ(ParseText("a=1\n  :include other.ini  \n:second\n", r, output), 2);
+  EXPECT_EQ(r.directives, (std::vector<std::string>{":include other.ini", ":second"}));
+  IniRecorder skipped;
+  EXPECT_EQ(ParseText(":directive\nk = v\n", skipped, output, false), 0);
+  EXPECT_EQ(skipped.entries.size(), 1u);
+  EXPECT_TRUE(skipped.directives.empty());
 }
 
 TEST(IniCore, LongLineArrivesInPiecesCountedAsLines) {
   IniRecorder r;
+  std::string output;
   // 6000 characters: 4999 in the first piece, the rest (no separator) in the second.
-  std::string longLine = "k=" + std::string(5998, 'x');
-  ParseOutcome out = ParseText(longLine + "\nnovalue\n", r);
-  EXPECT_EQ(out.result, 3);
+  EXPECT_EQ(ParseText("k=" + std::string(5998, 'x') + "\nnovalue\n", r, output), 3);
   ASSERT_EQ(r.entries.size(), 1u);
   EXPECT_EQ(r.entries[0].value, std::string(4997, 'x'));
-  EXPECT_EQ(out.output, "ERROR: No value found on line 2 in file test.ini for parameter " +
-                            std::string(1001, 'x') +
-                            "\r\nERROR: No value found on line 3 in file test.ini for parameter "
-                            "novalue\r\n");
+  EXPECT_EQ(output, kNoValue + "2 in file test.ini for parameter " + std::string(1001, 'x') +
+                        "\r\n" + kNoValue + "3 in file test.ini for parameter novalue\r\n");
 }
 
 TEST(IniCore, NullValueHandlerIsNeverCalled) {
@@ -193,25 +137,10 @@ TEST(IniCore, CallerBufferAndLineSource) {
                             sizeof small),
             2);
   EXPECT_EQ(testing::internal::GetCapturedStdout(),
-            "ERROR: No value found on line 2 in file (null) for parameter abcdefg\r\n");
+            kNoValue + "2 in file (null) for parameter abcdefg\r\n");
   EXPECT_EQ(ini::ParseLines(NextLine, &source, IniRecorder::OnValue, nullptr, &r, nullptr, small,
                             1),
             0);
-}
-
-TEST(IniCore, Helpers) {
-  char text[] = "  ab \t\r\n";
-  EXPECT_EQ(ini::StripWhitespacesAtEnd(text), text);
-  EXPECT_STREQ(text, "  ab");
-  EXPECT_STREQ(ini::FindFirstNonWhitespace(text), "ab");
-  EXPECT_STREQ(ini::FindFirstNonWhitespace("   "), "");
-  EXPECT_STREQ(ini::FindCharOrComment(";x=1", '='), "=1");
-  EXPECT_STREQ(ini::FindCharOrComment("x ;=1", '='), ";=1");
-  EXPECT_STREQ(ini::FindCharOrComment("x\t;", '\0'), ";");
-  EXPECT_STREQ(ini::FindCharOrComment("abc", 'z'), "");
-  char dst[4];
-  EXPECT_EQ(ini::strncpy0(dst, "abcdef", sizeof dst), dst);
-  EXPECT_STREQ(dst, "abc");
 }
 
 }  // namespace
