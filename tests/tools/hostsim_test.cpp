@@ -258,6 +258,10 @@ TEST(HostModeAttach, ReportsWhichFileIsWrong) {
   dir.Write("dev/mtd0.ini", "medium = nor\n");
   EXPECT_TRUE(stbplat::hostsim::Attach(dir.path(), &error)) << error;
   stbplat::hostsim::Detach();
+
+  dir.Write("memory-map.ini", "[device NOR0]\ntechnology = SPI_NOR.\nsize = 0x10000\n");
+  EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
+  EXPECT_NE(std::string::npos, error.find("needs technology, base and size")) << error;
 }
 
 }  // namespace

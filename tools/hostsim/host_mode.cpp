@@ -16,6 +16,7 @@
 #include <memory>
 
 #include "device_root.h"
+#include "stbplat/memory_map.h"
 #include "os/seam.h"
 
 namespace stbplat {
@@ -216,6 +217,14 @@ bool Attach(const std::string& root, std::string* error) {
   Detach();
   std::unique_ptr<DeviceRoot> device = DeviceRoot::Load(root, error);
   if (!device) return false;
+  // The platform reads its memory map itself, from the host's file system.
+  // Without one the device has only its MTD partitions.
+  std::string map = root + "/memory-map.ini";
+  if (access(map.c_str(), F_OK) != 0) {
+    ExtendedMemoryMapStructure::Reset();
+  } else if (!ExtendedMemoryMapStructure::Load(map.c_str(), error)) {
+    return false;
+  }
   State().device = std::move(device);
   State().binding.reset(new os::ScopedSysCalls(HostTable()));
   return true;
@@ -226,6 +235,7 @@ void Detach() {
   state.binding.reset();
   for (auto& entry : state.open) Libc().close(entry.first);
   state.open.clear();
+  if (state.device) ExtendedMemoryMapStructure::Reset();
   state.device.reset();
 }
 

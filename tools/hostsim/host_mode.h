@@ -1,14 +1,16 @@
 // Host mode: runs the library against a device emulated from files.
 //
 // A device root holds
-//   memory-map.ini          the platform memory map (devices, partitions, slots)
+//   memory-map.ini          the platform memory map (devices, partitions, slots);
+//                           without it the device has only its MTD partitions
 //   proc/mtd                the kernel's partition table, as on the device
 //   dev/mtdN                one image per MTD partition
 //   dev/mtdN.ini            its geometry: type (nor, nand, emmc), erase and
 //                           page size, OOB size, bad blocks
 //   dev/mmca                the whole eMMC device
 // While attached, the library's device and file calls for /proc/mtd and
-// /dev/... are answered from these files; every other path is passed on.
+// /dev/... are answered from these files, every other path is passed on, and
+// the platform's memory map is the one in the root.
 #ifndef STBPLAT_HOSTSIM_HOST_MODE_H
 #define STBPLAT_HOSTSIM_HOST_MODE_H
 

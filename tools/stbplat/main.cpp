@@ -44,6 +44,8 @@ int Run(int argc, char** argv) {
                "More library messages on standard error (repeat for more)");
 
   RegisterRecordCommands(app);
+  RegisterFlashCommands(app);
+  RegisterMapCommand(app);
   RegisterChecksumCommands(app);
   RegisterDiskCommands(app);
   RegisterUtilCommands(app);

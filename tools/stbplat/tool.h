@@ -40,6 +40,8 @@ GlobalOptions& Options();
 
 // Each command group adds its subcommands to the top-level app.
 void RegisterRecordCommands(CLI::App& app);
+void RegisterFlashCommands(CLI::App& app);
+void RegisterMapCommand(CLI::App& app);
 void RegisterDiskCommands(CLI::App& app);
 void RegisterChecksumCommands(CLI::App& app);
 void RegisterUtilCommands(CLI::App& app);
