@@ -14,16 +14,16 @@ namespace {
 constexpr unsigned int kDefaultLevel = eLogLevelError;
 constexpr const char* kLevelEnv = "STBPLAT_LOG_LEVEL";
 
-void ApplyLevelSpec(unsigned int* levels, const char* spec) {
-  if (spec == nullptr || *spec == '\0') return;
-  if (std::strchr(spec, '=') == nullptr) {
+void ApplyLevelSetting(unsigned int* levels, const char* setting) {
+  if (setting == nullptr || *setting == '\0') return;
+  if (std::strchr(setting, '=') == nullptr) {
     char* end = nullptr;
-    unsigned long level = std::strtoul(spec, &end, 10);
-    if (end != spec)
+    unsigned long level = std::strtoul(setting, &end, 10);
+    if (end != setting)
       for (int i = 0; i < eLogModuleCount; ++i) levels[i] = static_cast<unsigned int>(level);
     return;
   }
-  const char* p = spec;
+  const char* p = setting;
   while (*p != '\0') {
     char* end = nullptr;
     unsigned long module = std::strtoul(p, &end, 10);
@@ -39,7 +39,7 @@ void ApplyLevelSpec(unsigned int* levels, const char* spec) {
 }
 
 struct LevelsFromEnvironment {
-  LevelsFromEnvironment() { ApplyLevelSpec(subSystemLogLevel, std::getenv(kLevelEnv)); }
+  LevelsFromEnvironment() { ApplyLevelSetting(subSystemLogLevel, std::getenv(kLevelEnv)); }
 };
 
 }  // namespace

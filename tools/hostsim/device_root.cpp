@@ -18,20 +18,20 @@ constexpr int kMaxMtd = 30;
 constexpr uint64_t kDefaultNandPage = 2048;
 constexpr const char* kDevicePrefixes[] = {"/dev/", "/proc/", "/sys/"};
 
-using Spec = std::map<std::string, std::string>;
+using Settings = std::map<std::string, std::string>;
 
-bool CollectSpec(void* user, const char*, const char* name, const char* value) {
-  (*static_cast<Spec*>(user))[name] = value;
+bool CollectSettings(void* user, const char*, const char* name, const char* value) {
+  (*static_cast<Settings*>(user))[name] = value;
   return true;
 }
 
 char* ReadLine(char* buffer, int size, FILE* file) { return std::fgets(buffer, size, file); }
 
-// dev/NAME.ini; an absent file is an empty spec.
-bool ReadSpec(const std::string& path, Spec* spec, std::string* error) {
+// dev/NAME.ini; an absent file is no settings.
+bool ReadSettings(const std::string& path, Settings* settings, std::string* error) {
   FILE* file = std::fopen(path.c_str(), "r");
   if (file == nullptr) return true;
-  int bad = stbplat::ini::IniParseFile(file, ReadLine, CollectSpec, nullptr, spec, path.c_str());
+  int bad = stbplat::ini::IniParseFile(file, ReadLine, CollectSettings, nullptr, settings, path.c_str());
   std::fclose(file);
   if (bad != 0) {
     *error = path + ":" + std::to_string(bad) + ": bad line";
@@ -40,10 +40,10 @@ bool ReadSpec(const std::string& path, Spec* spec, std::string* error) {
   return true;
 }
 
-bool Number(const Spec& spec, const char* key, uint64_t* value, const std::string& where,
+bool Number(const Settings& settings, const char* key, uint64_t* value, const std::string& where,
             std::string* error) {
-  auto it = spec.find(key);
-  if (it == spec.end()) return true;
+  auto it = settings.find(key);
+  if (it == settings.end()) return true;
   char* end = nullptr;
   unsigned long long parsed = std::strtoull(it->second.c_str(), &end, 0);
   if (end == it->second.c_str() || *end != '\0') {
@@ -66,9 +66,9 @@ Medium GuessMedium(const std::string& name) {
   return Medium::kNor;
 }
 
-bool ParseMedium(const Spec& spec, Medium* medium, const std::string& where, std::string* error) {
-  auto it = spec.find("medium");
-  if (it == spec.end()) return true;
+bool ParseMedium(const Settings& settings, Medium* medium, const std::string& where, std::string* error) {
+  auto it = settings.find("medium");
+  if (it == settings.end()) return true;
   if (it->second == "nor") *medium = Medium::kNor;
   else if (it->second == "nand") *medium = Medium::kNand;
   else if (it->second == "emmc") *medium = Medium::kEmmc;
@@ -79,14 +79,14 @@ bool ParseMedium(const Spec& spec, Medium* medium, const std::string& where, std
   return true;
 }
 
-// Geometry from a spec over the defaults given.
-bool ApplySpec(const Spec& spec, Geometry* g, const std::string& where, std::string* error) {
-  if (!ParseMedium(spec, &g->medium, where, error)) return false;
+// Geometry from the settings over the defaults given.
+bool ApplySettings(const Settings& settings, Geometry* g, const std::string& where, std::string* error) {
+  if (!ParseMedium(settings, &g->medium, where, error)) return false;
   if (g->medium == Medium::kNand) g->writeSize = kDefaultNandPage;
-  if (!Number(spec, "size", &g->size, where, error) ||
-      !Number(spec, "erasesize", &g->eraseSize, where, error) ||
-      !Number(spec, "writesize", &g->writeSize, where, error) ||
-      !Number(spec, "oobsize", &g->oobSize, where, error))
+  if (!Number(settings, "size", &g->size, where, error) ||
+      !Number(settings, "erasesize", &g->eraseSize, where, error) ||
+      !Number(settings, "writesize", &g->writeSize, where, error) ||
+      !Number(settings, "oobsize", &g->oobSize, where, error))
     return false;
   if (g->writeSize == 0 || g->size == 0 || (g->medium != Medium::kEmmc && g->eraseSize == 0)) {
     *error = where + ": size, erasesize and writesize must not be 0";
@@ -147,8 +147,8 @@ FlashImage* DeviceRoot::Image(const std::string& name, std::string* error) {
   auto found = images_.find(name);
   if (found != images_.end()) return found->second.get();
   std::string path = root_ + "/dev/" + name;
-  Spec spec;
-  if (!ReadSpec(path + ".ini", &spec, error)) return nullptr;
+  Settings settings;
+  if (!ReadSettings(path + ".ini", &settings, error)) return nullptr;
   Geometry g;
   auto mtd = mtdSizes_.find(name);
   if (mtd != mtdSizes_.end()) {
@@ -158,7 +158,7 @@ FlashImage* DeviceRoot::Image(const std::string& name, std::string* error) {
   } else {
     g.medium = Medium::kEmmc;
   }
-  if (!ApplySpec(spec, &g, path + ".ini", error)) return nullptr;
+  if (!ApplySettings(settings, &g, path + ".ini", error)) return nullptr;
   std::unique_ptr<FlashImage> image = FlashImage::Open(path, g, error);
   if (!image) return nullptr;
   FlashImage* raw = image.get();
@@ -169,14 +169,14 @@ FlashImage* DeviceRoot::Image(const std::string& name, std::string* error) {
 bool DeviceRoot::LoadNode(int number, uint64_t size, uint64_t eraseSize, const std::string& name,
                           std::string* error) {
   std::string self = "mtd" + std::to_string(number);
-  std::string specPath = root_ + "/dev/" + self + ".ini";
-  Spec spec;
-  if (!ReadSpec(specPath, &spec, error)) return false;
-  std::string imageName = spec.count("image") ? spec["image"] : self;
+  std::string settingsPath = root_ + "/dev/" + self + ".ini";
+  Settings settings;
+  if (!ReadSettings(settingsPath, &settings, error)) return false;
+  std::string imageName = settings.count("image") ? settings["image"] : self;
   MtdNode node;
   node.image = Image(imageName, error);
   if (node.image == nullptr) return false;
-  if (!Number(spec, "offset", &node.base, specPath, error)) return false;
+  if (!Number(settings, "offset", &node.base, settingsPath, error)) return false;
   node.geometry = node.image->geometry();
   node.geometry.size = size;
   if (eraseSize != 0 && eraseSize != node.geometry.eraseSize && node.geometry.medium != Medium::kEmmc) {
@@ -185,7 +185,7 @@ bool DeviceRoot::LoadNode(int number, uint64_t size, uint64_t eraseSize, const s
   }
   if (node.base > node.image->geometry().size || size > node.image->geometry().size - node.base ||
       (node.geometry.eraseSize != 0 && node.base % node.geometry.eraseSize != 0)) {
-    *error = specPath + ": offset and size do not fit image " + imageName;
+    *error = settingsPath + ": offset and size do not fit image " + imageName;
     return false;
   }
   nodes_[number] = node;
