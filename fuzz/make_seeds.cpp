@@ -111,6 +111,7 @@ int main(int argc, char** argv) {
     return 2;
   }
   const std::string dir = argv[1];
+  mkdir(dir.c_str(), 0755);
   const VersionEntry version = Version();
   const MemoryConfigDescriptor memory = Memory();
   const BseckReloadDescriptor bseck = Bseck();
