@@ -529,8 +529,9 @@ int FlashSim::NodeWrite(Node& node, uint64_t offset, const void* data, size_t co
   return 0;
 }
 
-ssize_t FlashSim::Read(int fd, void* buffer, size_t count) {
-  if (Hit(SimCall::kRead)) return -1;
+template <typename Transfer>
+ssize_t FlashSim::DescriptorTransfer(SimCall call, int fd, Transfer transfer) {
+  if (Hit(call)) return -1;
   auto it = handles_.find(fd);
   Node* node = it == handles_.end() ? nullptr : Find(it->second->path);
   if (node == nullptr) {
@@ -538,7 +539,7 @@ ssize_t FlashSim::Read(int fd, void* buffer, size_t count) {
     return -1;
   }
   size_t done = 0;
-  int error = NodeRead(*node, it->second->position, buffer, count, &done);
+  int error = transfer(*node, it->second->position, &done);
   if (error != 0) {
     errno = error;
     return -1;
@@ -547,22 +548,16 @@ ssize_t FlashSim::Read(int fd, void* buffer, size_t count) {
   return static_cast<ssize_t>(done);
 }
 
+ssize_t FlashSim::Read(int fd, void* buffer, size_t count) {
+  return DescriptorTransfer(SimCall::kRead, fd, [&](Node& node, uint64_t position, size_t* done) {
+    return NodeRead(node, position, buffer, count, done);
+  });
+}
+
 ssize_t FlashSim::Write(int fd, const void* data, size_t count) {
-  if (Hit(SimCall::kWrite)) return -1;
-  auto it = handles_.find(fd);
-  Node* node = it == handles_.end() ? nullptr : Find(it->second->path);
-  if (node == nullptr) {
-    errno = EBADF;
-    return -1;
-  }
-  size_t done = 0;
-  int error = NodeWrite(*node, it->second->position, data, count, &done);
-  if (error != 0) {
-    errno = error;
-    return -1;
-  }
-  it->second->position += done;
-  return static_cast<ssize_t>(done);
+  return DescriptorTransfer(SimCall::kWrite, fd, [&](Node& node, uint64_t position, size_t* done) {
+    return NodeWrite(node, position, data, count, done);
+  });
 }
 
 int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {

@@ -134,6 +134,11 @@ class FlashSim {
   std::string ProcMtdText() const;
 
  private:
+  // A read or write through a descriptor: the fault check, the node lookup,
+  // the node-level transfer and the position update they share.
+  template <typename Transfer>
+  ssize_t DescriptorTransfer(SimCall call, int fd, Transfer transfer);
+
   os::SysCalls table_;
   std::unique_ptr<os::ScopedSysCalls> binding_;
   std::map<std::string, std::shared_ptr<Node>> nodes_;
