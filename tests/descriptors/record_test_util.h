@@ -89,42 +89,28 @@ inline Bytes Data(const std::string& text) {
 // A memory stream that reports 64-bit positions: getP64/setP64 map onto
 // the buffer offset, so that the records' 64-bit paths can be driven and
 // observed without a device.
-class Memory64Extruder : public Extruder {
+template <typename Stream, typename Buffer>
+class Memory64Stream : public Stream {
  public:
-  Memory64Extruder(const unsigned char* buffer, unsigned int size) : Extruder(buffer, size) {
-    is64Address = true;
+  Memory64Stream(Buffer buffer, unsigned int size) : Stream(buffer, size) {
+    this->is64Address = true;
   }
   unsigned long getP64() override {
     ++getP64Calls;
-    return static_cast<unsigned long>(pCurrent - pStart);
+    return static_cast<unsigned long>(this->pCurrent - this->pStart);
   }
   bool setP64(unsigned long offset) override {
     ++setP64Calls;
-    if (offset > length) return false;
-    return setP(const_cast<unsigned char*>(pStart) + offset);
+    if (offset > this->length) return false;
+    return this->setP(const_cast<unsigned char*>(this->pStart) + offset);
   }
   int getP64Calls = 0;
   int setP64Calls = 0;
 };
 
+using Memory64Extruder = Memory64Stream<Extruder, const unsigned char*>;
 // The writing twin of Memory64Extruder.
-class Memory64Intruder : public Intruder {
- public:
-  Memory64Intruder(unsigned char* buffer, unsigned int size) : Intruder(buffer, size) {
-    is64Address = true;
-  }
-  unsigned long getP64() override {
-    ++getP64Calls;
-    return static_cast<unsigned long>(pCurrent - pStart);
-  }
-  bool setP64(unsigned long offset) override {
-    ++setP64Calls;
-    if (offset > length) return false;
-    return setP(const_cast<unsigned char*>(pStart) + offset);
-  }
-  int getP64Calls = 0;
-  int setP64Calls = 0;
-};
+using Memory64Intruder = Memory64Stream<Intruder, unsigned char*>;
 
 }  // namespace records_test
 
