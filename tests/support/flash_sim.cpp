@@ -16,6 +16,9 @@ namespace test {
 namespace {
 
 constexpr uint8_t kErased = 0xFF;
+// The NAND driver checks ECC in steps of this many bytes; an unreadable
+// page counts one failure per step.
+constexpr uint32_t kEccStep = 256;
 constexpr const char* kProcMtdPath = "/proc/mtd";
 constexpr const char* kDevMemPath = "/dev/mem";
 
@@ -52,11 +55,21 @@ struct FlashSim::Node {
   std::set<uint64_t> eccFailures;
   std::set<uint64_t> weakOffsets;
   uint32_t eccFailed = 0;
+  // What ECCGETSTATS reports: the partition counts every successful
+  // MEMSETBADBLOCK, a block marked twice included.
+  uint32_t badBlockCount = 0;
+  uint32_t garbageReads = 0;
   std::vector<std::pair<uint64_t, uint64_t>> writes;
   std::vector<std::pair<uint64_t, uint64_t>> erases;
   bool isMtd() const { return kind == SimKind::kNor || kind == SimKind::kNand; }
   uint64_t BlockOf(uint64_t offset) const {
     return eraseSize == 0 ? offset : offset - offset % eraseSize;
+  }
+  uint64_t PageOf(uint64_t offset) const { return offset - offset % writeSize; }
+  uint32_t EccSteps() const { return std::max<uint32_t>(1, writeSize / kEccStep); }
+  void AddBad(uint64_t offset, bool countAgain) {
+    bool added = badBlocks.insert(BlockOf(offset)).second;
+    if (added || countAgain) ++badBlockCount;
   }
 };
 
@@ -277,7 +290,10 @@ bool FlashSim::Hit(SimCall call, SimCall specific) {
       error = fault->error;
     }
   }
-  if (fire) errno = error;
+  if (fire) {
+    errno = error;
+    failed_.push_back(specific != SimCall::kAny ? specific : call);
+  }
   return fire;
 }
 
@@ -372,7 +388,7 @@ void FlashSim::Poke(const std::string& path, uint64_t offset, const std::vector<
 
 void FlashSim::MarkBad(const std::string& path, uint64_t offset) {
   Node* node = Find(path);
-  if (node != nullptr) node->badBlocks.insert(node->BlockOf(offset));
+  if (node != nullptr) node->AddBad(offset, false);
 }
 
 bool FlashSim::IsBad(const std::string& path, uint64_t offset) const {
@@ -486,8 +502,24 @@ int FlashSim::NodeRead(Node& node, uint64_t offset, void* buffer, size_t count, 
   if (offset >= size) return 0;
   size_t n = static_cast<size_t>(std::min<uint64_t>(count, size - offset));
   node.storage->Read(offset, buffer, n);
+  // The driver reads whole pages: a failing page counts once per ECC step
+  // however little of it was asked for, and its bytes come back scrambled.
+  std::set<uint64_t> failedPages;
   for (uint64_t failure : node.eccFailures)
-    if (failure >= offset && failure < offset + n) ++node.eccFailed;
+    if (node.PageOf(failure) < offset + n && node.PageOf(failure) + node.writeSize > offset)
+      failedPages.insert(node.PageOf(failure));
+  auto* bytes = static_cast<uint8_t*>(buffer);
+  for (uint64_t page : failedPages) {
+    node.eccFailed += node.EccSteps();
+    uint32_t state = static_cast<uint32_t>(page) ^ (++node.garbageReads * 0x9E3779B9u);
+    uint64_t from = std::max(page, offset);
+    uint64_t to = std::min<uint64_t>(page + node.writeSize, offset + n);
+    for (uint64_t at = from; at < to; ++at) {
+      state = state * 1103515245u + 12345u;
+      // Never 0, so every byte differs from what was programmed.
+      bytes[at - offset] ^= static_cast<uint8_t>(1 + (state >> 16) % 255);
+    }
+  }
   *done = n;
   return 0;
 }
@@ -503,28 +535,35 @@ int FlashSim::NodeWrite(Node& node, uint64_t offset, const void* data, size_t co
     *done = count;
     return 0;
   }
-  if (offset > size || count > size - offset) return offset >= size ? ENOSPC : EINVAL;
-  for (uint64_t weak : node.weakOffsets)
-    if (weak >= offset && weak < offset + count) return EIO;
-  const auto* bytes = static_cast<const uint8_t*>(data);
-  if (node.kind == SimKind::kNand) {
-    if (offset % node.writeSize != 0 || count % node.writeSize != 0) return EINVAL;
-    for (uint64_t block = node.BlockOf(offset); block < offset + count; block += node.eraseSize)
-      if (node.badBlocks.count(block) != 0) return EIO;
-    std::vector<uint8_t> current(count);
-    node.storage->Read(offset, current.data(), count);
-    for (uint8_t byte : current)
-      if (byte != kErased) return EIO;
-    node.storage->Write(offset, data, count);
-  } else if (node.kind == SimKind::kNor) {
-    std::vector<uint8_t> current(count);
-    node.storage->Read(offset, current.data(), count);
-    for (size_t i = 0; i < count; ++i) current[i] &= bytes[i];
-    node.storage->Write(offset, current.data(), count);
-  } else {
-    node.storage->Write(offset, data, count);
+  // A device takes what fits before its end; only a write starting there
+  // fails.
+  if (offset >= size) return ENOSPC;
+  count = static_cast<size_t>(std::min<uint64_t>(count, size - offset));
+  if (node.kind == SimKind::kNand &&
+      (offset % node.writeSize != 0 || count % node.writeSize != 0))
+    return EINVAL;
+  // A weak page fails the write after the pages before it and the page
+  // itself were programmed.
+  size_t programmed = count;
+  bool weakPage = false;
+  for (uint64_t weak : node.weakOffsets) {
+    if (weak < offset || weak >= offset + count) continue;
+    weakPage = true;
+    programmed = std::min<size_t>(programmed, node.PageOf(weak) + node.writeSize - offset);
   }
-  node.writes.emplace_back(offset, count);
+  const auto* bytes = static_cast<const uint8_t*>(data);
+  if (node.isMtd()) {
+    // Flash cells only go from 1 to 0; the MTD layer does not consult the
+    // bad-block table on writes.
+    std::vector<uint8_t> cells(programmed);
+    node.storage->Read(offset, cells.data(), programmed);
+    for (size_t i = 0; i < programmed; ++i) cells[i] &= bytes[i];
+    node.storage->Write(offset, cells.data(), programmed);
+  } else {
+    node.storage->Write(offset, data, programmed);
+  }
+  node.writes.emplace_back(offset, programmed);
+  if (weakPage) return EIO;
   *done = count;
   return 0;
 }
@@ -591,26 +630,32 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
       auto* stats = static_cast<mtd_ecc_stats*>(argument);
       *stats = mtd_ecc_stats{};
       stats->failed = node->eccFailed;
-      stats->badblocks = static_cast<__u32>(node->badBlocks.size());
+      stats->badblocks = node->badBlockCount;
       return 0;
     }
     case SimCall::kMemErase: {
       auto* region = static_cast<erase_info_user*>(argument);
       uint64_t start = region->start;
       uint64_t length = region->length;
-      if (length == 0 || start % node->eraseSize != 0 || length % node->eraseSize != 0 ||
-          start + length > size) {
+      if (start >= size || length > size - start) {
         errno = EINVAL;
         return -1;
       }
+      if (length == 0) return 0;
+      if (start % node->eraseSize != 0 || length % node->eraseSize != 0) {
+        errno = EINVAL;
+        return -1;
+      }
+      // Block by block: the blocks before a bad one are erased.
+      std::vector<uint8_t> erased(node->eraseSize, kErased);
       for (uint64_t block = start; block < start + length; block += node->eraseSize) {
         if (node->badBlocks.count(block) != 0) {
+          if (block > start) node->erases.emplace_back(start, block - start);
           errno = EIO;
           return -1;
         }
+        node->storage->Write(block, erased.data(), erased.size());
       }
-      std::vector<uint8_t> erased(length, kErased);
-      node->storage->Write(start, erased.data(), length);
       node->erases.emplace_back(start, length);
       return 0;
     }
@@ -633,7 +678,7 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
         errno = EINVAL;
         return -1;
       }
-      node->badBlocks.insert(node->BlockOf(offset));
+      node->AddBad(offset, true);
       return 0;
     }
     default:

@@ -4,17 +4,28 @@
 // plain files (slot files), and /dev/mem over fake physical regions. FILE*
 // streams (fopen64) are real FILE objects made with fopencookie.
 //
-// MTD rules, as the kernel applies them:
+// MTD rules, as the kernel (nandsim, the MTD character device) applies them:
 // - NOR: any offset and length; programming only clears bits (the caller
 //   erases first); erase sets 0xFF; no bad blocks (MEMSETBADBLOCK is
-//   refused with EOPNOTSUPP, MEMGETBADBLOCK answers 0).
-// - NAND: writes start on a page and are whole pages (EINVAL otherwise),
-//   only into erased pages, never into a bad block (EIO); erases are
-//   block-aligned (EINVAL) and fail on a bad block (EIO); reads of a range
-//   with an injected ECC failure succeed with the data and raise the failed
-//   counter of ECCGETSTATS, as the kernel does.
-// - erased bytes read 0xFF; seeking or erasing past the end is EINVAL; a
-//   read at the end returns 0 bytes.
+//   refused with EOPNOTSUPP, MEMGETBADBLOCK answers 0). The kernel's mtdram,
+//   which the system tests use for NOR, overwrites instead and reports type
+//   MTD_RAM with a write size of 1; real NOR clears bits, as here.
+// - NAND: writes start on a page and are whole pages (EINVAL otherwise);
+//   programming a written page clears bits (AND); a block marked bad still
+//   takes writes (only erases look at the bad-block table); a weak page
+//   (FailWritesAt) fails the write with EIO after the pages before it and
+//   the weak page itself were programmed.
+// - Erase: a region of 0 bytes inside the device succeeds and does nothing;
+//   otherwise block-aligned (EINVAL); blocks are erased in order, and a bad
+//   one stops the erase with EIO after the good blocks before it.
+// - A page with an ECC failure (AddEccFailure) reads back scrambled (every
+//   byte differs), the read itself succeeds, and ECCGETSTATS' failed counter
+//   grows by one per 256-byte ECC step of the page on every read touching it.
+// - ECCGETSTATS' bad-block count grows with every successful
+//   MEMSETBADBLOCK, a block marked twice counting twice.
+// - Writes past the end are cut at the end; a write starting at the end
+//   fails with ENOSPC. Erased bytes read 0xFF; seeking or erasing past the
+//   end is EINVAL; a read at the end returns 0 bytes.
 //
 // The bytes of each node live behind SimStorage, so a file-backed store can
 // replace the in-memory one without touching the node rules.
@@ -84,9 +95,10 @@ class FlashSim {
   void Poke(const std::string& path, uint64_t offset, const std::vector<uint8_t>& data);
   void MarkBad(const std::string& path, uint64_t offset);
   bool IsBad(const std::string& path, uint64_t offset) const;
-  // A read covering offset counts one uncorrectable ECC failure.
+  // Every read touching the page that holds offset fails its ECC checks.
   void AddEccFailure(const std::string& path, uint64_t offset);
-  // Writes covering offset fail with EIO (a weak page) until cleared.
+  // Writes covering offset program up to the end of its page, then fail
+  // with EIO (a weak page), until cleared.
   void FailWritesAt(const std::string& path, uint64_t offset);
   void ClearWriteFailures();
 
@@ -94,6 +106,8 @@ class FlashSim {
   // persistent: that one and every later one.
   void FailCall(SimCall call, int nth, int error, bool persistent = false);
   void ClearFaults();
+  // The calls a fault made fail, most specific kind first-come.
+  const std::vector<SimCall>& FailedCalls() const { return failed_; }
   int CallCount(SimCall call) const;
   // Writes (write and MEMERASE) reaching a node, as (offset, length) pairs.
   const std::vector<std::pair<uint64_t, uint64_t>>& Writes(const std::string& path) const;
@@ -144,6 +158,7 @@ class FlashSim {
   std::map<std::string, std::shared_ptr<Node>> nodes_;
   std::map<int, std::unique_ptr<Handle>> handles_;
   std::vector<std::unique_ptr<Fault>> faults_;
+  std::vector<SimCall> failed_;
   std::map<SimCall, int> counts_;
   std::map<int, std::string> procLines_;
   std::string procOverride_;
