@@ -92,6 +92,12 @@ TEST_F(DeviceCopy, WriteThenReadBackAcrossABadBlock) {
   const size_t pageWithOob = 2048 + 64;
   EXPECT_EQ(0x00, nand[5 * 64 * pageWithOob + 2048]);  // still marked bad
   EXPECT_EQ('a', nand[6 * 64 * pageWithOob]);           // the data starts in block 6
+  // Without --length a read takes what the slot holds around its bad block.
+  ToolRun whole = Run({"flash", "read", "NAND0.ROOTFS.A", "-o", dir / "whole.bin"});
+  ASSERT_EQ(0, whole.exitCode) << whole.err;
+  std::vector<unsigned char> all = dir.Read("whole.bin");
+  ASSERT_EQ(all.size(), 256u * 1024);
+  EXPECT_TRUE(std::string(all.begin(), all.begin() + data.size()) == data);
 }
 
 TEST_F(DeviceCopy, NewFrontPanelTextGoesIntoItsSlot) {

@@ -43,6 +43,22 @@ struct Target {
   Medium medium = Medium::kOther;
 };
 
+// What a transfer can reach: NAND transfers skip bad blocks, so a NAND
+// partition holds its size less its bad blocks.
+unsigned long Capacity(const MtdPartition& p) {
+  if (p.medium != Medium::kNand) return p.size;
+  unsigned long bad = static_cast<unsigned long>(p.badBlocks.size()) * p.eraseSize;
+  return bad < p.size ? p.size - bad : 0;
+}
+
+// Sets the room left from offset to the end of partition p.
+void SetRoom(Target& t, const MtdPartition& p) {
+  t.medium = p.medium;
+  if (t.offset > Capacity(p)) return;
+  t.room = Capacity(p) - t.offset;
+  t.roomKnown = true;
+}
+
 const MtdPartition* FindPartition(const DeviceTable& table, const std::string& name) {
   for (const MtdPartition& p : table.partitions)
     if (p.name == name) return &p;
@@ -52,7 +68,7 @@ const MtdPartition* FindPartition(const DeviceTable& table, const std::string& n
 Target ParseTarget(const std::string& text, bool mtd, const std::string& command) {
   Target t;
   t.text = text;
-  DeviceTable table = LoadDeviceTable(false);
+  DeviceTable table = LoadDeviceTable(true);
   if (mtd) {
     t.form = TargetForm::kMtd;
     size_t plus = text.find('+');
@@ -61,10 +77,8 @@ Target ParseTarget(const std::string& text, bool mtd, const std::string& command
     const MtdPartition* p = FindPartition(table, t.mtdName);
     if (p == nullptr)
       throw UsageError(command + ": --mtd " + t.mtdName + ": no such partition (see stbplat mtd list)");
-    if (t.offset > p->size) throw UsageError(command + ": offset " + Hex(t.offset) + " lies past the end of " + t.mtdName);
-    t.room = p->size - t.offset;
-    t.roomKnown = true;
-    t.medium = p->medium;
+    SetRoom(t, *p);
+    if (!t.roomKnown) throw UsageError(command + ": offset " + Hex(t.offset) + " lies past the end of " + t.mtdName);
     return t;
   }
   if (!text.empty() && std::isdigit(static_cast<unsigned char>(text[0]))) {
@@ -80,13 +94,7 @@ Target ParseTarget(const std::string& text, bool mtd, const std::string& command
   // A slot with a partition of its own tells its size.
   std::string upper = t.location.device + "." + t.location.partition + "." + t.location.slot;
   std::transform(upper.begin(), upper.end(), upper.begin(), [](unsigned char c) { return std::toupper(c); });
-  if (const MtdPartition* p = FindPartition(table, upper)) {
-    if (t.offset <= p->size) {
-      t.room = p->size - t.offset;
-      t.roomKnown = true;
-    }
-    t.medium = p->medium;
-  }
+  if (const MtdPartition* p = FindPartition(table, upper)) SetRoom(t, *p);
   return t;
 }
 
