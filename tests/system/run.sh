@@ -19,15 +19,16 @@ build=${STBPLAT_SYSTEM_BUILD:-$root/build/system}
 bound=${STBPLAT_SYSTEM_TIMEOUT:-600}
 start=$(date +%s)
 
-"$root/scripts/deps.sh" build system
+"$root/scripts/deps.sh" build tools system
 
 # --- Build the library and the guest programs ------------------------------
 cmake -S "$root" -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo \
   -DCMAKE_CXX_COMPILER=g++ -DCMAKE_C_COMPILER=gcc \
-  -DSTBPLAT_BUILD_TESTS=OFF -DSTBPLAT_BUILD_TOOLS=OFF \
+  -DSTBPLAT_BUILD_TESTS=OFF -DSTBPLAT_BUILD_TOOLS=ON \
   -DSTBPLAT_BUILD_SYSTEM_TESTS=ON >/dev/null
-cmake --build "$build" -j2 --target stbplat_systest
+cmake --build "$build" -j2 --target stbplat_systest stbplat_tool
 guest_bin="$build/tests/system/stbplat_systest"
+tool_bin="$build/tools/stbplat"
 
 # --- Kernel -------------------------------------------------------------------
 if [ -n "${STBPLAT_SYSTEM_KVER:-}" ]; then
@@ -68,17 +69,21 @@ cp /bin/busybox "$rootfs/bin/busybox"
 for tool in nanddump nandwrite flash_erase mtdinfo mtdpart hdparm smartctl; do
   put_program "$(command -v "$tool")"
 done
-# The guest program and the project's libraries go to /opt/stbplat (the
-# build tree may lie under /tmp, which the guest mounts over).
-mkdir -p "$rootfs/opt/stbplat/lib"
+# The guest program, the tool and the project's libraries go to
+# /opt/stbplat (the build tree may lie under /tmp, which the guest mounts
+# over).
+mkdir -p "$rootfs/opt/stbplat/lib" "$rootfs/opt/stbplat/bin"
 cp "$guest_bin" "$rootfs/opt/stbplat/systest"
-ldd "$guest_bin" | awk '/=> \//{print $3} /^[ \t]*\/.*ld-linux/{print $1}' |
-  while read -r lib; do
-    case "$lib" in
-      "$build"/*) cp -L "$lib" "$rootfs/opt/stbplat/lib/$(basename "$lib")" ;;
-      *) put "$lib" ;;
-    esac
-  done
+cp "$tool_bin" "$rootfs/opt/stbplat/bin/stbplat"
+for program in "$guest_bin" "$tool_bin"; do
+  ldd "$program" | awk '/=> \//{print $3} /^[ \t]*\/.*ld-linux/{print $1}' |
+    while read -r lib; do
+      case "$lib" in
+        "$build"/*) cp -L "$lib" "$rootfs/opt/stbplat/lib/$(basename "$lib")" ;;
+        *) put "$lib" ;;
+      esac
+    done
+done
 
 # smartctl's drive database: the packaged one, plus a local entry for the
 # emulated disk's model (see init.sh for why).
@@ -117,9 +122,12 @@ echo "${STBPLAT_SYSTEM_ONLY:-}" >"$rootfs/etc/systest-only"
 (cd "$rootfs" && find . | cpio -o -H newc --quiet) | gzip -1 >"$vm/initramfs.gz"
 
 # --- Disks -------------------------------------------------------------------------
-rm -f "$vm/hdd.img" "$vm/emmc.img"
+# xfer.img carries files out of the guest: a tar archive written over the
+# raw disk (see the tool scenarios).
+rm -f "$vm/hdd.img" "$vm/emmc.img" "$vm/xfer.img"
 truncate -s 256M "$vm/hdd.img"
 truncate -s 64M "$vm/emmc.img"
+truncate -s 16M "$vm/xfer.img"
 
 # --- Boot ------------------------------------------------------------------------------
 console="$vm/console.log"
@@ -138,7 +146,9 @@ timeout -k 10 "$bound" qemu-system-x86_64 \
   -drive if=none,id=hdd,file="$vm/hdd.img",format=raw \
   -device ide-hd,drive=hdd,bus=ide.0,model=ST1000DM003-1SB102,serial=Z9A0SYS1 \
   -drive if=none,id=emmc,file="$vm/emmc.img",format=raw \
-  -device virtio-blk-pci,drive=emmc
+  -device virtio-blk-pci,drive=emmc \
+  -drive if=none,id=xfer,file="$vm/xfer.img",format=raw \
+  -device virtio-blk-pci,drive=xfer
 qemu_rc=$?
 set -e
 end=$(date +%s)
@@ -147,6 +157,7 @@ end=$(date +%s)
 # The guest writes "PASS <name>", "FAIL <name>: <why>", "INFO <text>" and a
 # final "DONE" to its second serial port.
 tr -d '\r' <"$results" >"$results.clean"
+"$here/host_checks.sh" "$vm/xfer.img" "$tool_bin" "$here/memory-map.ini" >>"$results.clean"
 grep '^INFO ' "$results.clean" | sed 's/^INFO /  /' || true
 grep -E '^(PASS|FAIL) ' "$results.clean" || true
 passed=$(grep -c '^PASS ' "$results.clean" || true)

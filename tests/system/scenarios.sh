@@ -129,3 +129,49 @@ if want flash.erase_weak_block || want flash.weak_page_relocation || want flash.
     run_flash $s
   done
 fi
+
+# ---- The stbplat tool on the real devices -------------------------------------------
+# KERNEL.B (mtd10) is 16 blocks with block 4 bad from the factory. The tool
+# writes 5 blocks and a bit across it; the guest's read, a nanddump --oob
+# --bb=dumpbad image and the partition table go out through the transfer disk, where the
+# runner reads the image back in host mode (host_checks.sh).
+STBPLAT=/opt/stbplat/bin/stbplat
+XFER_DISK=/realdev/vdb
+if want tool.mtd_list || want tool.nand_dump; then
+  nand_load badblocks=$BAD_AT_LOAD || fail tool "nandsim reload"
+fi
+if want tool.mtd_list; then
+  s=tool.mtd_list
+  check $s "mtd list exits 0" $STBPLAT mtd list
+  $STBPLAT mtd list >/tmp/ml 2>&1; cat /tmp/ml
+  check $s "KERNEL.B row" grep -Eq '^mtd10 +NAND0\.KERNEL\.B +NAND +2 MiB +128 KiB +2 KiB +1$' /tmp/ml
+  check $s "USER.A has no bad block" grep -Eq '^mtd13 +NAND0\.USER\.A +NAND .* 0$' /tmp/ml
+  check $s "NOR slot row" grep -Eq '^mtd2 +NOR0\.CFG\.A +NOR +512 KiB +64 KiB' /tmp/ml
+  $STBPLAT --json mtd list >/tmp/mj 2>&1
+  check $s "JSON bad blocks of KERNEL.B" sh -c \
+    "tr -d ' \n' </tmp/mj | grep -q '\"name\":\"NAND0.KERNEL.B\"[^}]*\"badBlocks\":\[524288\]'"
+  scenario_end $s
+fi
+if want tool.nand_dump; then
+  s=tool.nand_dump
+  mkdir -p /tmp/xfer
+  dd if=/dev/urandom of=/tmp/in bs=1000 count=$((5 * BLOCK / 1000 + 1)) 2>/dev/null
+  check $s "refused without --yes" sh -c "! $STBPLAT flash write NAND0.KERNEL.B /tmp/in"
+  check $s "flash write" $STBPLAT flash write --erase --yes NAND0.KERNEL.B /tmp/in
+  check $s "flash read" $STBPLAT flash read NAND0.KERNEL.B -o /tmp/xfer/guest.read
+  check $s "read spans the good blocks" test "$(stat -c %s /tmp/xfer/guest.read)" -eq $((15 * BLOCK))
+  check $s "data reads back" cmp -n "$(stat -c %s /tmp/in)" /tmp/in /tmp/xfer/guest.read
+  check $s "nanddump agrees" nanddump -q --bb=skipbad -f /tmp/skip /dev/mtd10
+  check $s "same bytes as nanddump" cmp /tmp/skip /tmp/xfer/guest.read
+  check $s "bad block untouched" sh -c \
+    "nanddump -q --bb=dumpbad -s $((4 * BLOCK)) -l $BLOCK -f /tmp/b4 /dev/mtd10 && \
+     ! cmp -s -n $BLOCK /tmp/b4 /tmp/in"
+  # nanddump leaves bad blocks out by default; the image keeps them in place.
+  check $s "nanddump --oob" nanddump -q --oob --bb=dumpbad -f /tmp/xfer/mtd10.oob /dev/mtd10
+  check $s "dump size" test "$(stat -c %s /tmp/xfer/mtd10.oob)" -eq $((16 * 64 * (PAGE + 64)))
+  grep '^mtd10:' /proc/mtd >/tmp/xfer/mtd10.row
+  $STBPLAT mtd list | grep '^mtd10 ' >/tmp/xfer/guest.mtdlist
+  check $s "archive to the transfer disk" tar -cf $XFER_DISK -C /tmp/xfer .
+  sync
+  scenario_end $s
+fi

@@ -250,6 +250,15 @@ TEST(HostModeAttach, ReportsWhichFileIsWrong) {
   EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
   EXPECT_NE(std::string::npos, error.find("dev/mtd0: 100 bytes, expected 65536")) << error;
 
+  // A NAND dump with OOB that is a block short: nanddump's default left the
+  // bad block out.
+  dir.Write("proc/mtd", "dev:    size   erasesize  name\nmtd0: 00010000 00004000 \"flash1\"\n");
+  dir.Write("dev/mtd0.ini", "medium = nand\nwritesize = 512\noobsize = 16\n");
+  dir.Write("dev/mtd0", std::string(3 * 32 * (512 + 16), 'x'));
+  EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
+  EXPECT_NE(std::string::npos, error.find("take it with nanddump --oob --bb=dumpbad")) << error;
+
+  dir.Write("proc/mtd", "dev:    size   erasesize  name\nmtd0: 00010000 00004000 \"flash0\"\n");
   dir.Write("dev/mtd0", std::vector<unsigned char>(0x10000, 0xFF));
   dir.Write("dev/mtd0.ini", "medium = flash\n");
   EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));

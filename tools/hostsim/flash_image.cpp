@@ -53,11 +53,17 @@ std::unique_ptr<FlashImage> FlashImage::Open(const std::string& path, const Geom
     withOob = true;
   } else if (fileSize != geometry.size) {
     std::string expected = std::to_string(geometry.size);
-    if (geometry.medium == Medium::kNand && geometry.oobSize != 0 && geometry.writeSize != 0)
-      expected += " (plain) or " +
-                  std::to_string(geometry.size / geometry.writeSize *
-                                 (geometry.writeSize + geometry.oobSize)) +
-                  " (with OOB)";
+    bool nandWithOob = geometry.medium == Medium::kNand && geometry.oobSize != 0 &&
+                       geometry.writeSize != 0 && geometry.eraseSize != 0;
+    if (nandWithOob) {
+      uint64_t pages = geometry.size / geometry.writeSize;
+      uint64_t blockBytes = geometry.eraseSize / geometry.writeSize * (geometry.writeSize + geometry.oobSize);
+      expected += " (plain) or " + std::to_string(pages * (geometry.writeSize + geometry.oobSize)) + " (with OOB)";
+      // nanddump leaves bad blocks out unless told otherwise, and then their
+      // places are lost.
+      if (fileSize % blockBytes == 0 && fileSize < pages * (geometry.writeSize + geometry.oobSize))
+        expected += "; a dump short of whole blocks lacks its bad blocks: take it with nanddump --oob --bb=dumpbad";
+    }
     *error = path + ": " + std::to_string(fileSize) + " bytes, expected " + expected;
     close(fd);
     return nullptr;
