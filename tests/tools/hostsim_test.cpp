@@ -191,18 +191,30 @@ TEST_F(HostModeTest, ProgrammingClearsBitsOnlyAndEraseSetsABlockToOnes) {
   EXPECT_EQ(0x30, dir.Read("dev/mtd0")[0x4000 + 100]);
 }
 
-TEST_F(HostModeTest, NandTakesWholePagesAndRefusesBadBlocks) {
+TEST_F(HostModeTest, NandFollowsTheKernelAtItsEdges) {
   int fd = Open("/dev/mtd2");
   std::vector<unsigned char> page(kPage, 0x00);
   Sys().lseek64(fd, 10, SEEK_SET);
   EXPECT_EQ(-1, Sys().write(fd, page.data(), kPage));
   EXPECT_EQ(EINVAL, errno);
-  Sys().lseek64(fd, 2 * kBlock, SEEK_SET);
-  EXPECT_EQ(-1, Sys().write(fd, page.data(), kPage));
+  // Erasing blocks 1 and 2 (bad) erases block 1, then fails.
+  Sys().lseek64(fd, kBlock, SEEK_SET);
+  ASSERT_EQ(static_cast<ssize_t>(kPage), Sys().write(fd, page.data(), kPage));
+  erase_info_user across = {static_cast<__u32>(kBlock), static_cast<__u32>(2 * kBlock)};
+  EXPECT_EQ(-1, Sys().ioctl(fd, MEMERASE, &across));
   EXPECT_EQ(EIO, errno);
-  erase_info_user bad = {static_cast<__u32>(2 * kBlock), static_cast<__u32>(kBlock)};
-  EXPECT_EQ(-1, Sys().ioctl(fd, MEMERASE, &bad));
-  EXPECT_EQ(EIO, errno);
+  EXPECT_EQ(std::vector<unsigned char>(4, 0xFF), ReadAt(fd, kBlock, 4));
+  erase_info_user empty = {static_cast<__u32>(kBlock + 10), 0};
+  EXPECT_EQ(0, Sys().ioctl(fd, MEMERASE, &empty));
+  // Writes ignore the bad-block table, and are cut at the end.
+  Sys().lseek64(fd, 2 * kBlock + kPage, SEEK_SET);
+  EXPECT_EQ(static_cast<ssize_t>(kPage), Sys().write(fd, page.data(), kPage));
+  EXPECT_EQ(1, IsBad(fd, 2 * kBlock));
+  std::vector<unsigned char> two(2 * kPage, 0x00);
+  Sys().lseek64(fd, kNandSize - kPage, SEEK_SET);
+  EXPECT_EQ(static_cast<ssize_t>(kPage), Sys().write(fd, two.data(), two.size()));
+  EXPECT_EQ(-1, Sys().write(fd, two.data(), kPage));
+  EXPECT_EQ(ENOSPC, errno);
 
   erase_info_user good = {static_cast<__u32>(kBlock), static_cast<__u32>(kBlock)};
   ASSERT_EQ(0, Sys().ioctl(fd, MEMERASE, &good));

@@ -145,12 +145,11 @@ int FlashImage::Read(uint64_t offset, void* buffer, size_t length) const {
 int FlashImage::Write(uint64_t offset, const void* data, size_t length) {
   if (offset > geometry_.size || length > geometry_.size - offset) return ENOSPC;
   if (geometry_.medium == Medium::kEmmc) return RawWrite(offset, data, length);
-  if (geometry_.medium == Medium::kNand) {
-    // NAND is programmed in whole pages, and a bad block takes no data.
-    if (offset % geometry_.writeSize != 0 || length % geometry_.writeSize != 0) return EINVAL;
-    for (uint64_t at = offset; at < offset + length; at += geometry_.eraseSize - at % geometry_.eraseSize)
-      if (IsBad(at)) return EIO;
-  }
+  // NAND is programmed in whole pages. As in the kernel, the bad-block table
+  // is not consulted: only erases refuse bad blocks.
+  if (geometry_.medium == Medium::kNand &&
+      (offset % geometry_.writeSize != 0 || length % geometry_.writeSize != 0))
+    return EINVAL;
   // Programming clears bits only.
   const unsigned char* in = static_cast<const unsigned char*>(data);
   std::vector<unsigned char> cells(std::min(length, kChunk));
@@ -165,14 +164,15 @@ int FlashImage::Write(uint64_t offset, const void* data, size_t length) {
 }
 
 int FlashImage::Erase(uint64_t offset, uint64_t length) {
-  if (geometry_.eraseSize == 0 || offset % geometry_.eraseSize != 0 ||
-      length % geometry_.eraseSize != 0 || length == 0 || offset > geometry_.size ||
-      length > geometry_.size - offset)
+  // The kernel's order: the range first, an empty one succeeds, then the
+  // alignment; blocks go in order and a bad one stops the erase.
+  if (offset >= geometry_.size || length > geometry_.size - offset) return EINVAL;
+  if (length == 0) return 0;
+  if (geometry_.eraseSize == 0 || offset % geometry_.eraseSize != 0 || length % geometry_.eraseSize != 0)
     return EINVAL;
-  for (uint64_t at = offset; at < offset + length; at += geometry_.eraseSize)
-    if (IsBad(at)) return EIO;
   std::vector<unsigned char> erased(geometry_.eraseSize, kErased);
   for (uint64_t at = offset; at < offset + length; at += geometry_.eraseSize) {
+    if (IsBad(at)) return EIO;
     if (int error = RawWrite(at, erased.data(), erased.size())) return error;
     if (hasOob_) {
       std::vector<unsigned char> oob(geometry_.oobSize, kErased);

@@ -9,6 +9,7 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
@@ -114,7 +115,10 @@ ssize_t HostWrite(int fd, const void* data, size_t count) {
   OpenMtd* mtd = Lookup(fd);
   if (mtd == nullptr) return Libc().write(fd, data, count);
   const Geometry& g = mtd->node->geometry;
-  if (mtd->position > g.size || count > g.size - mtd->position) return Fail(ENOSPC);
+  // The character device cuts a write at its end; only one starting there
+  // fails.
+  if (mtd->position >= g.size) return Fail(ENOSPC);
+  count = std::min<uint64_t>(count, g.size - mtd->position);
   if (int error = mtd->node->image->Write(mtd->node->base + mtd->position, data, count))
     return Fail(error);
   mtd->position += count;
@@ -142,7 +146,7 @@ int HostIoctl(int fd, unsigned long request, void* argument) {
     case MEMERASE: {
       erase_info_user region;
       std::memcpy(&region, argument, sizeof region);
-      if (static_cast<uint64_t>(region.start) + region.length > g.size) return Fail(EINVAL);
+      if (region.start >= g.size || region.length > g.size - region.start) return Fail(EINVAL);
       if (int error = node.image->Erase(node.base + region.start, region.length)) return Fail(error);
       return 0;
     }
