@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # Installs the Debian packages that building and testing need, when missing.
-# Usage: deps.sh [group...]   groups: build (default), system, cross, tools
+# Usage: deps.sh [group...]   groups: build (default), system, cross, tools,
+#                              system-arm64
 set -euo pipefail
 groups=("${@:-build}")
 want=()
@@ -10,6 +11,7 @@ for g in "${groups[@]}"; do
     tools)  want+=(libcli11-dev nlohmann-json3-dev) ;;
     system) want+=(qemu-system-x86 linux-image-amd64 busybox-static mtd-utils smartmontools hdparm cpio kmod xz-utils) ;;
     cross)  want+=(g++-aarch64-linux-gnu binutils-aarch64-linux-gnu qemu-user googletest) ;;
+    system-arm64) want+=(qemu-system-arm) ;;
     *) echo "deps.sh: unknown group $g" >&2; exit 2 ;;
   esac
 done

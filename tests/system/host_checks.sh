@@ -6,9 +6,11 @@
 # tool.dump_in_host_mode: the guest's nanddump --oob image of KERNEL.B
 # (mtd10, a factory-bad block) read in host mode must give the very bytes
 # NANDRead gave on the device.
-# Usage: host_checks.sh XFER_IMAGE TOOL MEMORY_MAP
+# Usage: host_checks.sh XFER_IMAGE MEMORY_MAP TOOL_COMMAND...
 set -uo pipefail
-xfer=$1 tool=$2 map=$3
+xfer=$1 map=$2
+shift 2
+tool=("$@")
 work=$(dirname "$xfer")/xfer
 rm -rf "$work"
 mkdir -p "$work"
@@ -24,7 +26,7 @@ cp "$map" "$root/memory-map.ini"
 cp "$work/mtd10.oob" "$root/dev/mtd10"
 printf 'medium = nand\nwritesize = 2048\noobsize = 64\n' >"$root/dev/mtd10.ini"
 
-if ! "$tool" --root "$root" flash read NAND0.KERNEL.B -o "$work/host.read" 2>"$work/host.err"; then
+if ! "${tool[@]}" --root "$root" flash read NAND0.KERNEL.B -o "$work/host.read" 2>"$work/host.err"; then
   echo "FAIL $name: host-mode read failed: $(head -c 300 "$work/host.err" | tr '\n' ' ')"
   exit 0
 fi
@@ -32,7 +34,7 @@ if ! cmp -s "$work/host.read" "$work/guest.read"; then
   echo "FAIL $name: host-mode read differs from the guest's NANDRead ($(cmp "$work/host.read" "$work/guest.read" 2>&1 | head -1))"
   exit 0
 fi
-"$tool" --root "$root" mtd list | grep '^mtd10 ' >"$work/host.mtdlist"
+"${tool[@]}" --root "$root" mtd list | grep '^mtd10 ' >"$work/host.mtdlist"
 if ! cmp -s "$work/host.mtdlist" "$work/guest.mtdlist"; then
   echo "FAIL $name: mtd list rows differ: host '$(cat "$work/host.mtdlist")', guest '$(cat "$work/guest.mtdlist")'"
   exit 0

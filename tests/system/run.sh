@@ -1,46 +1,45 @@
 #!/usr/bin/env bash
-# System tests: boots the distribution kernel under qemu with a busybox
-# initramfs holding the guest test programs, simulated NAND (nandsim) and NOR
-# (mtdram) flash, an AHCI hard disk and a virtio disk standing in for the
-# eMMC, then turns the guest's result lines into this script's result.
+# System tests: boots a Debian kernel under qemu with a busybox initramfs
+# holding the guest test programs, simulated NAND (nandsim) and NOR (mtdram)
+# flash, an AHCI hard disk and a virtio disk standing in for the eMMC, then
+# turns the guest's result lines into this script's result.
 #
 # Usage: tests/system/run.sh            (from anywhere)
 # Environment:
+#   STBPLAT_SYSTEM_ARCH     x86_64 (default: the host's kernel on q35) or
+#                           aarch64 (Debian's arm64 kernel on virt, with the
+#                           device build); see arch-*.sh
 #   STBPLAT_SYSTEM_TIMEOUT  seconds before a hung guest is killed (default 600)
-#   STBPLAT_SYSTEM_BUILD    build directory (default build/system)
+#   STBPLAT_SYSTEM_BUILD    build directory (default build/system, or
+#                           build/system-aarch64)
 #   STBPLAT_SYSTEM_ONLY     space-separated scenario names to run (default all)
-#   STBPLAT_SYSTEM_KVER     kernel version under /lib/modules (default newest
-#                           one that has a /boot/vmlinuz)
+#   STBPLAT_SYSTEM_KVER     x86_64: kernel version under /lib/modules (default
+#                           the newest one that has a /boot/vmlinuz)
 set -euo pipefail
 
 here=$(cd "$(dirname "$0")" && pwd)
 root=$(cd "$here/../.." && pwd)
-build=${STBPLAT_SYSTEM_BUILD:-$root/build/system}
+arch=${STBPLAT_SYSTEM_ARCH:-x86_64}
+[ -f "$here/arch-$arch.sh" ] || { echo "run.sh: no guest for architecture $arch" >&2; exit 2; }
+# shellcheck source=arch-x86_64.sh
+. "$here/arch-$arch.sh"
 bound=${STBPLAT_SYSTEM_TIMEOUT:-600}
 start=$(date +%s)
 
-"$root/scripts/deps.sh" build tools system
+arch_deps
 
 # --- Build the library and the guest programs ------------------------------
-cmake -S "$root" -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo \
-  -DCMAKE_CXX_COMPILER=g++ -DCMAKE_C_COMPILER=gcc \
-  -DSTBPLAT_BUILD_TESTS=OFF -DSTBPLAT_BUILD_TOOLS=ON \
+targets=(stbplat_systest)
+[ "$build_tool" = ON ] && targets+=(stbplat_tool)
+cmake -S "$root" -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo "${cmake_args[@]}" \
+  -DSTBPLAT_BUILD_TESTS=OFF -DSTBPLAT_BUILD_TOOLS="$build_tool" \
   -DSTBPLAT_BUILD_SYSTEM_TESTS=ON >/dev/null
-cmake --build "$build" -j2 --target stbplat_systest stbplat_tool
+cmake --build "$build" -j2 --target "${targets[@]}"
 guest_bin="$build/tests/system/stbplat_systest"
 tool_bin="$build/tools/stbplat"
 
 # --- Kernel -------------------------------------------------------------------
-if [ -n "${STBPLAT_SYSTEM_KVER:-}" ]; then
-  kver=$STBPLAT_SYSTEM_KVER
-else
-  kver=""
-  for k in $(ls /lib/modules | sort -V); do
-    [ -f "/boot/vmlinuz-$k" ] && kver=$k
-  done
-fi
-[ -n "$kver" ] || { echo "run.sh: no kernel with modules found" >&2; exit 2; }
-kernel=/boot/vmlinuz-$kver
+arch_kernel
 [ -r "$kernel" ] || { echo "run.sh: cannot read $kernel" >&2; exit 2; }
 
 # --- Initramfs ------------------------------------------------------------------
@@ -50,51 +49,45 @@ mkdir -p "$vm/root"
 rootfs="$vm/root"
 mkdir -p "$rootfs"/{bin,sbin,etc,proc,sys,dev,tmp,run,realdev,usr/bin,usr/sbin,var/lib/smartmontools/drivedb}
 
-# Copies a file into the initramfs under the same absolute path, following
-# symbolic links so the soname path holds the real library.
+# Copies a file into the initramfs at a path (by default its own),
+# following symbolic links so the soname path holds the real library.
 put() {
-  mkdir -p "$rootfs$(dirname "$1")"
-  cp -L "$1" "$rootfs$1"
+  local dest=${2:-$1}
+  mkdir -p "$rootfs$(dirname "$dest")"
+  cp -L "$1" "$rootfs$dest"
 }
 
-# A program and every shared library ldd lists for it (the dynamic loader
-# included).
+# A program (at its path below the packages' root) and every shared library
+# it loads; the project's own libraries go to /opt/stbplat/lib (the build
+# tree may lie under /tmp, which the guest mounts over).
 put_program() {
-  put "$1"
-  ldd "$1" 2>/dev/null | awk '/=> \//{print $3} /^[ \t]*\/.*ld-linux/{print $1}' |
-    while read -r lib; do put "$lib"; done
+  put "$1" "${2:-$1}"
+  arch_libs "$1" | while read -r lib; do
+    case "$lib" in
+      "$build"/*) put "$lib" "/opt/stbplat/lib/$(basename "$lib")" ;;
+      *) put "$lib" "$(arch_lib_dest "$lib")" ;;
+    esac
+  done
 }
 
-cp /bin/busybox "$rootfs/bin/busybox"
+put "$(arch_program busybox)" /bin/busybox
 for tool in nanddump nandwrite flash_erase mtdinfo mtdpart hdparm smartctl; do
-  put_program "$(command -v "$tool")"
+  path=$(arch_program "$tool")
+  put_program "$path" "${path#"$sysroot"}"
 done
-# The guest program, the tool and the project's libraries go to
-# /opt/stbplat (the build tree may lie under /tmp, which the guest mounts
-# over).
-mkdir -p "$rootfs/opt/stbplat/lib" "$rootfs/opt/stbplat/bin"
-cp "$guest_bin" "$rootfs/opt/stbplat/systest"
-cp "$tool_bin" "$rootfs/opt/stbplat/bin/stbplat"
-for program in "$guest_bin" "$tool_bin"; do
-  ldd "$program" | awk '/=> \//{print $3} /^[ \t]*\/.*ld-linux/{print $1}' |
-    while read -r lib; do
-      case "$lib" in
-        "$build"/*) cp -L "$lib" "$rootfs/opt/stbplat/lib/$(basename "$lib")" ;;
-        *) put "$lib" ;;
-      esac
-    done
-done
+put_program "$guest_bin" /opt/stbplat/systest
+[ "$build_tool" = ON ] && put_program "$tool_bin" /opt/stbplat/bin/stbplat
 
 # smartctl's drive database: the packaged one, plus a local entry for the
 # emulated disk's model (see init.sh for why).
 for db in /var/lib/smartmontools/drivedb/drivedb.h /usr/share/smartmontools/drivedb.h; do
-  [ -f "$db" ] && put "$db"
+  [ -f "$sysroot$db" ] && put "$sysroot$db" "$db"
 done
 cp "$here/smart_drivedb.h" "$rootfs/etc/smart_drivedb.h"
 
 # Kernel modules with their dependencies, in load order. moddeps lists, per
 # module, the files to insmod (dependencies first).
-modules="mtd mtdram nandsim ahci sd_mod sg virtio_pci virtio_blk"
+modules="mtd mtdram nandsim ahci sd_mod sg virtio_pci virtio_blk virtio_console"
 : >"$rootfs/etc/moddeps"
 for m in $modules; do
   files=""
@@ -108,13 +101,18 @@ for m in $modules; do
       *) cp "$path" "$rootfs$dest" ;;
     esac
     files="$files $dest"
-  done < <(modprobe --show-depends -S "$kver" "$m")
+  done < <(modprobe --show-depends ${sysroot:+-d "$sysroot"} -S "$kver" "$m" 2>/dev/null)
   echo "$m:$files" >>"$rootfs/etc/moddeps"
 done
 
 # The box's memory map (devices, partitions, slots) for the platform
 # library, matching the partition table init.sh presents.
-[ -f "$here/memory-map.ini" ] && cp "$here/memory-map.ini" "$rootfs/etc/memory-map.ini"
+sed "s/0x30000000/$sdram_base/" "$here/memory-map.ini" >"$rootfs/etc/memory-map.ini"
+# What the guest's init needs to know of this machine.
+cat >"$rootfs/etc/systest-env" <<ENV
+RESULTS_PORT=$results_port
+SDRAM_BASE=$sdram_base
+ENV
 cp "$here/init.sh" "$rootfs/init"
 cp "$here/scenarios.sh" "$rootfs/etc/scenarios.sh"
 chmod +x "$rootfs/init"
@@ -137,14 +135,8 @@ results="$vm/results.txt"
 echo "run.sh: booting $kernel (log: $console)"
 boot_start=$(date +%s)
 set +e
-timeout -k 10 "$bound" qemu-system-x86_64 \
-  -machine q35 -accel tcg -cpu max -m 1024 -smp 1 \
-  -nodefaults -display none -no-reboot \
-  -kernel "$kernel" -initrd "$vm/initramfs.gz" \
-  -append 'console=ttyS0 memmap=1M$0x30000000 panic=-1 loglevel=4' \
-  -serial "file:$console" -serial "file:$results" \
-  -drive if=none,id=hdd,file="$vm/hdd.img",format=raw \
-  -device ide-hd,drive=hdd,bus=ide.0,model=ST1000DM003-1SB102,serial=Z9A0SYS1 \
+arch_qemu
+timeout -k 10 "$bound" "${qemu[@]}" \
   -drive if=none,id=emmc,file="$vm/emmc.img",format=raw \
   -device virtio-blk-pci,drive=emmc \
   -drive if=none,id=xfer,file="$vm/xfer.img",format=raw \
@@ -157,7 +149,7 @@ end=$(date +%s)
 # The guest writes "PASS <name>", "FAIL <name>: <why>", "INFO <text>" and a
 # final "DONE" to its second serial port.
 tr -d '\r' <"$results" >"$results.clean"
-"$here/host_checks.sh" "$vm/xfer.img" "$tool_bin" "$here/memory-map.ini" >>"$results.clean"
+"$here/host_checks.sh" "$vm/xfer.img" "$here/memory-map.ini" "${host_tool[@]}" >>"$results.clean"
 grep '^INFO ' "$results.clean" | sed 's/^INFO /  /' || true
 grep -E '^(PASS|FAIL) ' "$results.clean" || true
 passed=$(grep -c '^PASS ' "$results.clean" || true)
@@ -173,6 +165,6 @@ if [ "$passed" -eq 0 ] && [ "$failed" -eq 0 ]; then
   echo "FAIL vm: no results"
   failed=1
 fi
-echo "run.sh: guest ran $((end - boot_start))s, whole run $((end - start))s"
+echo "run.sh: $arch guest ran $((end - boot_start))s, whole run $((end - start))s"
 echo "$passed passed, $failed failed"
 [ "$failed" -eq 0 ]

@@ -60,8 +60,8 @@ fi
 
 if want smoke.devmem; then
   s=smoke.devmem
-  check $s "write reserved RAM" devmem 0x30000000 32 0xA5C3F00D
-  check $s "read it back" test "$(devmem 0x30000000 32)" = 0xA5C3F00D
+  check $s "write reserved RAM" devmem $SDRAM_BASE 32 0xA5C3F00D
+  check $s "read it back" test "$(devmem $SDRAM_BASE 32)" = 0xA5C3F00D
   scenario_end $s
 fi
 

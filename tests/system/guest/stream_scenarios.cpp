@@ -4,7 +4,10 @@
 #if __has_include("stbplat/flash_interface.h")
 
 #include <cstdio>
+#include <cstdlib>
+#include <sstream>
 #include <string>
+#include <vector>
 
 #include "harness.h"
 #include "mtd_device.h"
@@ -77,10 +80,28 @@ SCENARIO("streams.nand_record") {
   CHECK(std::equal(payload.begin(), payload.end(), back.GetData()));
 }
 
+// Whether /proc/iomem lists the physical address as System RAM.
+bool IsSystemRam(unsigned long address) {
+  std::vector<unsigned char> bytes = systest::ReadFile("/proc/iomem");
+  std::istringstream lines(std::string(bytes.begin(), bytes.end()));
+  std::string line;
+  while (std::getline(lines, line)) {
+    unsigned long first = 0, last = 0;
+    if (line.find("System RAM") != std::string::npos &&
+        std::sscanf(line.c_str(), " %lx-%lx", &first, &last) == 2 && first <= address &&
+        address <= last)
+      return true;
+  }
+  return false;
+}
+
 SCENARIO("streams.sdram") {
-  // SDRAM0.SCRATCH.A: 0x30000000, reserved with memmap= on the kernel line.
-  constexpr unsigned long kBase = 0x30000000;
+  // SDRAM0.SCRATCH.A: a range of physical memory the kernel leaves alone
+  // (its address depends on the machine; init.sh passes it on).
+  const char* base = std::getenv("STBPLAT_SYSTEST_SDRAM");
+  const unsigned long kBase = base != nullptr ? std::strtoul(base, nullptr, 0) : 0x30000000UL;
   constexpr unsigned int kOffset = 0x100;
+  constexpr unsigned long kReservedSize = 0x100000;
   ComponentLocation scratch(U("SDRAM0"), U("SCRATCH"), U("A"), 0);
   scratch.slotOffset = kOffset;
   {
@@ -113,12 +134,20 @@ SCENARIO("streams.sdram") {
   // The stream maps the whole slot size from the component's address, so a
   // component not at the slot's start maps past the slot's end. Where the
   // slot ends with the reserved range, the kernel refuses the mapping.
+  // Only System RAM is refused: where the range is followed by something
+  // else (the top of the virt machine's RAM left out with mem=), the kernel
+  // maps it and there is nothing to see.
   ComponentLocation last(U("SDRAM0"), U("SCRATCH"), U("B"), 0);
   last.slotOffset = kOffset;
   systest::ClearLog();
   Extruder refused(&last, false);
-  CHECK(!refused.isInitedOK);
-  CHECK_LOG("mmap failed: errno = 1\r\n");
+  bool ramFollows = IsSystemRam(kBase + kReservedSize);
+  if (ramFollows) {
+    CHECK(!refused.isInitedOK);
+    CHECK_LOG("mmap failed: errno = 1\r\n");
+  } else {
+    systest::Info("streams.sdram: no System RAM after the range here; the refused mapping is not shown");
+  }
   last.slotOffset = 0;
   Extruder whole(&last, false);
   CHECK(whole.isInitedOK);
