@@ -1,6 +1,6 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-fuzz test-system bench clean
+.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-fuzz test-system test-system-aarch64 bench clean
 
 all: build
 
@@ -43,9 +43,14 @@ test-fuzz: deps
 test-system:
 	@tests/system/run.sh
 
-# Everything CI runs; the system tests come last so that their summary line
-# closes the output.
-test: test-fuzz test-asan test-aarch64 test-unit test-system
+# The same on Debian's arm64 kernel (qemu's virt machine) with the device
+# build of the library, the guest program and the tool.
+test-system-aarch64:
+	@STBPLAT_SYSTEM_ARCH=aarch64 tests/system/run.sh
+
+# Everything CI runs; the system tests come last so that their summary lines
+# close the output.
+test: test-fuzz test-asan test-aarch64 test-unit test-system test-system-aarch64
 
 # Benchmarks (host, -O2): library rates beside their baselines; then the
 # size of the stripped device library.

@@ -11,7 +11,7 @@ for g in "${groups[@]}"; do
     tools)  want+=(libcli11-dev nlohmann-json3-dev) ;;
     system) want+=(qemu-system-x86 linux-image-amd64 busybox-static mtd-utils smartmontools hdparm cpio kmod xz-utils) ;;
     cross)  want+=(g++-aarch64-linux-gnu binutils-aarch64-linux-gnu qemu-user googletest) ;;
-    system-arm64) want+=(qemu-system-arm) ;;
+    system-arm64) want+=(qemu-system-arm make xz-utils kmod cpio) ;;
     *) echo "deps.sh: unknown group $g" >&2; exit 2 ;;
   esac
 done

@@ -1,12 +1,11 @@
 # The AArch64 guest: Debian's arm64 kernel, busybox, mtd-utils, hdparm and
 # smartctl unpacked from their packages (scripts/fetch-arm64-guest.sh), the
-# project cross-built for the device, on qemu's virt machine.
+# flash simulators that kernel leaves out built as modules from Debian's
+# source (scripts/build-flash-modules.sh), and the project cross-built for
+# the device, on qemu's virt machine.
 # Sourced by run.sh; see arch-x86_64.sh for the other side of each name.
 build=${STBPLAT_SYSTEM_BUILD:-$root/build/system-aarch64}
 cmake_args=(-DCMAKE_TOOLCHAIN_FILE="$root/cmake/toolchain-aarch64.cmake")
-# The tool needs CLI11 and nlohmann-json for the target; the guest goes
-# without it and its scenarios say they were skipped.
-build_tool=OFF
 cross=/usr/aarch64-linux-gnu
 sysroot=$root/build/arm64-guest/root
 # virt has one PL011; the results go to a virtio console instead.
@@ -17,9 +16,10 @@ console_port=ttyAMA0
 sdram_base=0x70000000
 
 arch_deps() {
-  "$root/scripts/deps.sh" build system cross
+  "$root/scripts/deps.sh" build tools system cross
   "$root/scripts/deps.sh" system-arm64
   kver=$("$root/scripts/fetch-arm64-guest.sh" "$root/build/arm64-guest")
+  "$root/scripts/build-flash-modules.sh" "$sysroot" "$kver" arm64 aarch64-linux-gnu
 }
 
 arch_kernel() {  # sets kver and kernel (kver came with the packages)

@@ -2,7 +2,6 @@
 # Sourced by run.sh; see arch-aarch64.sh for the other side of each name.
 build=${STBPLAT_SYSTEM_BUILD:-$root/build/system}
 cmake_args=(-DCMAKE_CXX_COMPILER=g++ -DCMAKE_C_COMPILER=gcc)
-build_tool=ON
 sysroot=""
 results_port=ttyS1
 console_port=ttyS0

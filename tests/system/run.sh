@@ -29,12 +29,10 @@ start=$(date +%s)
 arch_deps
 
 # --- Build the library and the guest programs ------------------------------
-targets=(stbplat_systest)
-[ "$build_tool" = ON ] && targets+=(stbplat_tool)
 cmake -S "$root" -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo "${cmake_args[@]}" \
-  -DSTBPLAT_BUILD_TESTS=OFF -DSTBPLAT_BUILD_TOOLS="$build_tool" \
+  -DSTBPLAT_BUILD_TESTS=OFF -DSTBPLAT_BUILD_TOOLS=ON \
   -DSTBPLAT_BUILD_SYSTEM_TESTS=ON >/dev/null
-cmake --build "$build" -j2 --target "${targets[@]}"
+cmake --build "$build" -j2 --target stbplat_systest stbplat_tool
 guest_bin="$build/tests/system/stbplat_systest"
 tool_bin="$build/tools/stbplat"
 
@@ -76,7 +74,7 @@ for tool in nanddump nandwrite flash_erase mtdinfo mtdpart hdparm smartctl; do
   put_program "$path" "${path#"$sysroot"}"
 done
 put_program "$guest_bin" /opt/stbplat/systest
-[ "$build_tool" = ON ] && put_program "$tool_bin" /opt/stbplat/bin/stbplat
+put_program "$tool_bin" /opt/stbplat/bin/stbplat
 
 # smartctl's drive database: the packaged one, plus a local entry for the
 # emulated disk's model (see init.sh for why).
