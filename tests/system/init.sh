@@ -38,26 +38,10 @@ say() { echo "$*" >"$RESULTS"; echo "systest: $*"; }
 pass() { say "PASS $1"; }
 fail() { say "FAIL $1: $2"; }
 info() { say "INFO $*"; }
-# Scenarios that need the kernel's flash simulators (nandsim, mtdram).
-needs_mtd() {
-  case "$1" in
-    smoke.mtd_table|smoke.nand_tools|kernel.*|flash.table|flash.nand*|flash.mtd_utils|\
-    flash.nor|flash.erase*|flash.timing|flash.weak*|flash.grave*|streams.nand_record|tool.*) return 0 ;;
-  esac
-  return 1
-}
 want() {
-  if [ -n "$ONLY" ]; then
-    listed=no
-    for w in $ONLY; do [ "$w" = "$1" ] && listed=yes; done
-    [ $listed = yes ] || return 1
-  fi
-  if [ "$HAVE_MTD_SIMS" = no ] && needs_mtd "$1"; then
-    grep -qx "$1" /tmp/skipped 2>/dev/null ||
-      { echo "$1" >>/tmp/skipped; info "skipped $1: kernel $KVER has no nandsim or mtdram"; }
-    return 1
-  fi
-  return 0
+  [ -z "$ONLY" ] && return 0
+  for w in $ONLY; do [ "$w" = "$1" ] && return 0; done
+  return 1
 }
 
 # ---- Modules ----------------------------------------------------------------
@@ -150,7 +134,6 @@ setup_nor() {
 # nand_load [extra nandsim parameters]: (re)loads the NAND simulator with the
 # box's partitions plus the given faults, and rebuilds the table.
 nand_load() {
-  [ "$HAVE_MTD_SIMS" = no ] && { make_table; return 0; }
   [ -d /sys/module/nandsim ] && rmmod nandsim
   load nandsim id_bytes=$NAND_ID parts=$NAND_PARTS "$@" || return 1
   make_table
@@ -161,17 +144,7 @@ echo "systest: kernel $KVER"
 for m in virtio_pci virtio_console ahci sd_mod sg virtio_blk mtd; do load $m; done
 for _ in 1 2 3 4 5; do [ -e /realdev/$RESULTS_PORT ] && break; sleep 1; done
 stty -F /realdev/$RESULTS_PORT raw -echo 2>/dev/null
-# The flash simulators may be missing (Debian's arm64 kernel has none of its
-# own; run.sh builds them): their scenarios then say they were skipped.
-HAVE_MTD_SIMS=yes
-for m in nandsim mtdram; do
-  [ -n "$(sed -n "s/^$m://p" /etc/moddeps)" ] || HAVE_MTD_SIMS=no
-done
-if [ $HAVE_MTD_SIMS = yes ]; then
-  setup_nor || fail setup "NOR simulator"
-else
-  info "kernel $KVER has no nandsim or mtdram: the flash scenarios are skipped"
-fi
+setup_nor || fail setup "NOR simulator"
 : >/tmp/fake_mtd
 mount --bind /tmp/fake_mtd /proc/mtd
 # Blocks bad from the factory: KERNEL.A block 2, KERNEL.B block 4,

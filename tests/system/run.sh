@@ -100,6 +100,8 @@ for m in $modules; do
     esac
     files="$files $dest"
   done < <(modprobe --show-depends ${sysroot:+-d "$sysroot"} -S "$kver" "$m" 2>/dev/null)
+  [ -n "$files" ] || modprobe --show-depends ${sysroot:+-d "$sysroot"} -S "$kver" "$m" 2>/dev/null |
+    grep -q '^builtin ' || { echo "run.sh: kernel $kver has no module $m" >&2; exit 2; }
   echo "$m:$files" >>"$rootfs/etc/moddeps"
 done
 
