@@ -28,15 +28,18 @@ int ScanReading(FILE* pipe, unsigned char column, unsigned int* reading) {
   return std::fscanf(pipe, "%3u", reading) == 1 ? 1 : 0;
 }
 
-// Seagate: the worst normalised value is the highest temperature.
-int ReadSeagate(const HardDriveNodeInfo* drive, unsigned int* pair) {
+// The current temperature is the raw value and the highest one is read from
+// a second column: Seagate's worst normalised value, or the maximum of the
+// "(Min/Max a/b)" that Hitachi and Toshiba put in the raw value.
+int ReadRawAndHighest(const HardDriveNodeInfo* drive, unsigned char highestColumn,
+                      unsigned int* pair) {
   pair[0] = pair[1] = 0;
-  unsigned char worst = 0;
+  unsigned char highest = 0;
   unsigned char raw = 0;
-  if (HardDriveGetTemperatureData(drive, kColumnWorst, &worst) != 1) return 0;
+  if (HardDriveGetTemperatureData(drive, highestColumn, &highest) != 1) return 0;
   if (HardDriveGetTemperatureData(drive, kColumnRaw, &raw) != 1) return 0;
   pair[0] = raw;
-  pair[1] = worst;
+  pair[1] = highest;
   return 1;
 }
 
@@ -53,18 +56,6 @@ int ReadWesternDigital(const HardDriveNodeInfo* drive, unsigned int* pair) {
   pair[0] = raw;
   pair[1] = static_cast<unsigned int>(static_cast<int>(raw) + (static_cast<int>(value) -
                                                                static_cast<int>(worst)));
-  return 1;
-}
-
-// Hitachi and Toshiba: the raw value carries "(Min/Max a/b)".
-int ReadMinMax(const HardDriveNodeInfo* drive, unsigned int* pair) {
-  pair[0] = pair[1] = 0;
-  unsigned char highest = 0;
-  unsigned char raw = 0;
-  if (HardDriveGetTemperatureData(drive, kColumnMinMax, &highest) != 1) return 0;
-  if (HardDriveGetTemperatureData(drive, kColumnRaw, &raw) != 1) return 0;
-  pair[0] = raw;
-  pair[1] = highest;
   return 1;
 }
 
@@ -130,12 +121,12 @@ bool HardDriveGetTemperature(const HardDriveNodeInfo* drive, unsigned int* pair)
   if (HardDriveGetVendorType(drive, &vendor) < 1) return false;
   switch (vendor) {
     case disk::kSeagate:
-      return disk::ReadSeagate(drive, pair) == 1;
+      return disk::ReadRawAndHighest(drive, disk::kColumnWorst, pair) == 1;
     case disk::kWesternDigital:
       return disk::ReadWesternDigital(drive, pair) == 1;
     case disk::kHitachi:
     case disk::kToshiba:
-      return disk::ReadMinMax(drive, pair) == 1;
+      return disk::ReadRawAndHighest(drive, disk::kColumnMinMax, pair) == 1;
     default:
       STBPLAT_DISK_TRACE("\n\r[ErrorMsg] [%s]: Unknow Hard Drive Vendor\n\r", __func__);
       return false;
