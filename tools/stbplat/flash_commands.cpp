@@ -7,9 +7,14 @@
 
 #include <algorithm>
 #include <cctype>
-#include <cstdio>
+#include <sys/stat.h>
 #include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
 #include <iostream>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -20,13 +25,18 @@
 #include "stbplat/extruder.h"
 #include "stbplat/flash_interface.h"
 #include "stbplat/intruder.h"
+#include "stbplat/memory_map.h"
 #include "tool.h"
 
 namespace stbtool {
 namespace {
 
-// Transfers move in pieces of this size, so that progress can be shown.
-constexpr unsigned long kPiece = 64 * 1024;
+// Transfers move in pieces of this size, a few erase blocks of any of the
+// device's media: memory stays bounded whatever the transfer's size, and
+// progress can be shown.
+constexpr unsigned long kPiece = 1024 * 1024;
+// What an erased eMMC slot holds, as erased flash does.
+constexpr unsigned char kErasedByte = 0xFF;
 
 enum class TargetForm { kLocation, kMtd, kNorAddress };
 
@@ -91,10 +101,21 @@ Target ParseTarget(const std::string& text, bool mtd, const std::string& command
     throw UsageError(command + ": TARGET '" + text +
                      "': expected DEVICE.PARTITION.SLOT[+OFFSET], --mtd NAME or a NOR address");
   t.offset = t.location.offset;
-  // A slot with a partition of its own tells its size.
+  // A slot with a partition of its own tells its size (less its bad
+  // blocks); any other slot takes its size from the memory map.
   std::string upper = t.location.device + "." + t.location.partition + "." + t.location.slot;
   std::transform(upper.begin(), upper.end(), upper.begin(), [](unsigned char c) { return std::toupper(c); });
-  if (const MtdPartition* p = FindPartition(table, upper)) SetRoom(t, *p);
+  if (const MtdPartition* p = FindPartition(table, upper)) {
+    SetRoom(t, *p);
+    return t;
+  }
+  Location location = ToComponentLocation(t.location).location;
+  unsigned long slotSize = 0, slotOffset = 0;
+  if (ExtendedMemoryMapStructure::Instance()->GetSlotSizeAndOffset(&location, &slotSize, &slotOffset) &&
+      t.offset <= slotSize) {
+    t.room = slotSize - t.offset;
+    t.roomKnown = true;
+  }
   return t;
 }
 
@@ -106,80 +127,175 @@ Location LocationOf(const LocationArg& arg) {
   return ToComponentLocation(arg).location;
 }
 
-// Reads `length` bytes of the target.
-std::vector<unsigned char> ReadTarget(const Target& t, unsigned long length) {
-  std::vector<unsigned char> bytes(length);
-  FlashInterface* flash = FlashInterface::Instance();
-  Progress progress("reading " + t.text, length);
-  if (t.form == TargetForm::kLocation) {
-    ComponentLocation component = ToComponentLocation(t.location);
-    Extruder in(&component, false);
-    if (!in.isInitedOK) throw Failure("flash read: cannot open " + t.text);
-    for (unsigned long done = 0; done < length;) {
-      unsigned int n = static_cast<unsigned int>(std::min(kPiece, length - done));
-      unsigned int status = in.extrude(bytes.data() + done, n);
-      if (status != kExtrudeOk && status != kExtrudeExhausted)
-        throw Failure("flash read: " + t.text + ": reading failed at offset " + Hex(t.offset + done));
-      done += n;
-      progress.Update(done);
+// The bytes of a target in order, one piece at a time, through the
+// library's own calls: a location through its stream (which follows the
+// slot's medium), an MTD partition or a NOR address by offset.
+class TargetStream {
+ public:
+  TargetStream(const Target& t, bool writing) : t_(t), component_(ToComponentLocation(t.location)) {
+    if (t.form != TargetForm::kLocation) return;
+    if (writing) {
+      out_.reset(new Intruder(&component_));
+      if (!out_->isInitedOK) throw Failure("flash write: cannot open " + t.text);
+    } else {
+      in_.reset(new Extruder(&component_, false));
+      if (!in_->isInitedOK) throw Failure("flash read: cannot open " + t.text);
     }
-    return bytes;
   }
-  for (unsigned long done = 0; done < length;) {
-    unsigned long n = std::min(kPiece, length - done);
+
+  // The target's own position of the next byte, for messages.
+  unsigned long Position() const { return (t_.form == TargetForm::kNorAddress ? t_.address : t_.offset) + done_; }
+
+  bool Read(unsigned char* data, unsigned long n) {
     bool ok = false;
-    if (t.form == TargetForm::kNorAddress) {
-      ok = flash->ReadFromNORFlashAtAddr(t.address + done, bytes.data() + done, n);
-    } else if (t.medium == Medium::kNand) {
-      ok = flash->NANDRead(bytes.data() + done, n, t.mtdName.c_str(), t.offset + done);
+    if (in_) {
+      unsigned int status = in_->extrude(data, static_cast<unsigned int>(n));
+      ok = status == kExtrudeOk || status == kExtrudeExhausted;
+    } else if (t_.form == TargetForm::kNorAddress) {
+      ok = flash_->ReadFromNORFlashAtAddr(Position(), data, n);
+    } else if (t_.medium == Medium::kNand) {
+      ok = flash_->NANDRead(data, n, t_.mtdName.c_str(), Position());
     } else {
       unsigned long base = 0;
-      const char* path = flash->LookupMTDPartition(t.mtdName.c_str(), &base);
-      ok = path != nullptr && flash->LinuxFlashRead(path, base + t.offset + done, bytes.data() + done, n);
+      const char* path = flash_->LookupMTDPartition(t_.mtdName.c_str(), &base);
+      ok = path != nullptr && flash_->LinuxFlashRead(path, base + Position(), data, n);
     }
-    if (!ok) throw Failure("flash read: " + t.text + ": reading failed at " + Hex((t.form == TargetForm::kNorAddress ? t.address : t.offset) + done));
-    done += n;
-    progress.Update(done);
+    if (ok) done_ += n;
+    return ok;
   }
-  return bytes;
+
+  bool Write(const unsigned char* data, unsigned long n) {
+    bool ok = false;
+    if (out_) {
+      unsigned int status = out_->intrude(data, static_cast<unsigned int>(n));
+      ok = status == kIntrudeOk || status == kIntrudeFull;
+    } else if (t_.form == TargetForm::kNorAddress) {
+      ok = flash_->WriteToNORFlashAtAddr(Position(), data, n);
+    } else if (t_.medium == Medium::kNand) {
+      ok = flash_->NANDWrite(data, n, t_.mtdName.c_str(), Position());
+    } else {
+      unsigned long base = 0;
+      const char* path = flash_->LookupMTDPartition(t_.mtdName.c_str(), &base);
+      ok = path != nullptr && flash_->LinuxFlashWrite(path, base + Position(), data, n);
+    }
+    if (ok) done_ += n;
+    return ok;
+  }
+
+  // NAND keeps a last partial page back until told to write it.
+  void Flush() { flash_->NANDFlushWrite(); }
+
+ private:
+  const Target& t_;
+  ComponentLocation component_;
+  FlashInterface* flash_ = FlashInterface::Instance();
+  std::unique_ptr<Extruder> in_;
+  std::unique_ptr<Intruder> out_;
+  unsigned long done_ = 0;
+};
+
+// A file given on the command line, "-" being standard input or output.
+class CommandFile {
+ public:
+  CommandFile(const std::string& path, bool writing) : path_(path) {
+    if (path == "-") {
+      file_ = writing ? stdout : stdin;
+      return;
+    }
+    file_ = std::fopen(path.c_str(), writing ? "wb" : "rb");
+    if (file_ == nullptr) throw Failure(path + ": " + std::strerror(errno));
+    owned_ = true;
+  }
+  ~CommandFile() {
+    if (owned_) std::fclose(file_);
+  }
+  CommandFile(const CommandFile&) = delete;
+  CommandFile& operator=(const CommandFile&) = delete;
+
+  bool IsStream() const { return !owned_; }
+  // Size of a regular file; false for standard input and pipes.
+  bool Size(unsigned long* size) const {
+    struct stat info;
+    if (!owned_ || fstat(fileno(file_), &info) != 0 || !S_ISREG(info.st_mode)) return false;
+    *size = static_cast<unsigned long>(info.st_size);
+    return true;
+  }
+  // Fills up to n bytes; fewer only at the end of the input.
+  unsigned long Read(unsigned char* data, unsigned long n) {
+    unsigned long got = std::fread(data, 1, n, file_);
+    if (got < n && std::ferror(file_)) throw Failure(path_ + ": " + std::strerror(errno));
+    return got;
+  }
+  void Write(const unsigned char* data, unsigned long n) {
+    if (std::fwrite(data, 1, n, file_) != n) throw Failure(path_ + ": write failed: " + std::strerror(errno));
+  }
+  void Rewind() { std::rewind(file_); }
+  void Close() {
+    bool failed = std::fflush(file_) != 0;
+    if (owned_) failed = std::fclose(file_) != 0 || failed;
+    owned_ = false;
+    if (failed) throw Failure(path_ + ": write failed: " + std::strerror(errno));
+  }
+
+ private:
+  std::string path_;
+  FILE* file_ = nullptr;
+  bool owned_ = false;
+};
+
+// Index of the first byte that differs, or n.
+unsigned long FirstDifference(const unsigned char* a, const unsigned char* b, unsigned long n) {
+  return static_cast<unsigned long>(std::mismatch(a, a + n, b).first - a);
 }
 
-void WriteTarget(const Target& t, const std::vector<unsigned char>& bytes) {
-  FlashInterface* flash = FlashInterface::Instance();
-  Progress progress("writing " + t.text, bytes.size());
-  if (t.form == TargetForm::kLocation) {
-    ComponentLocation component = ToComponentLocation(t.location);
-    Intruder out(&component);
-    if (!out.isInitedOK) throw Failure("flash write: cannot open " + t.text);
-    for (unsigned long done = 0; done < bytes.size();) {
-      unsigned int n = static_cast<unsigned int>(std::min<unsigned long>(kPiece, bytes.size() - done));
-      unsigned int status = out.intrude(bytes.data() + done, n);
-      if (status != kIntrudeOk && status != kIntrudeFull)
-        throw Failure("flash write: " + t.text + ": writing failed at offset " + Hex(t.offset + done));
-      done += n;
-      progress.Update(done);
+// Reads back `n` bytes at the verifier's position and compares them with
+// `expected`; a difference fails the command naming its offset.
+void VerifyPiece(TargetStream& back, const unsigned char* expected, unsigned long n, std::vector<unsigned char>& scratch,
+                 const Target& t, const std::string& file) {
+  unsigned long at = back.Position();
+  if (!back.Read(scratch.data(), n))
+    throw Failure("flash write --verify: " + t.text + ": reading back failed at " + Hex(at));
+  unsigned long i = FirstDifference(expected, scratch.data(), n);
+  if (i < n)
+    throw Failure("flash write --verify: " + t.text + " differs from " + file + " at offset " + Hex(at + i) +
+                  " (wrote " + Hex(expected[i], 2) + ", read " + Hex(scratch[i], 2) + ")");
+}
+
+// Streams the input into the target piece by piece; with verify, reads it
+// back: a file in a second pass once everything is written, standard input
+// (which cannot be read twice) piece by piece as it lands.
+unsigned long WriteFromFile(const Target& t, CommandFile& input, const std::string& name, bool verify,
+                            unsigned long total) {
+  std::vector<unsigned char> piece(kPiece), scratch(verify ? kPiece : 0);
+  TargetStream out(t, true);
+  std::unique_ptr<TargetStream> back;
+  if (verify && input.IsStream()) back.reset(new TargetStream(t, false));
+  Progress progress("writing " + t.text, total);
+  unsigned long done = 0;
+  for (unsigned long got; (got = input.Read(piece.data(), kPiece)) > 0; done += got) {
+    if (t.roomKnown && done + got > t.room)
+      throw Failure("flash write: " + name + " does not fit in " + t.text + " (" + std::to_string(t.room) +
+                    " bytes left)");
+    if (!out.Write(piece.data(), got)) throw Failure("flash write: " + t.text + ": writing failed at " + Hex(out.Position()));
+    if (back) {
+      out.Flush();
+      VerifyPiece(*back, piece.data(), got, scratch, t, name);
     }
-    // NAND keeps a partial last page back until told to write it.
-    flash->NANDFlushWrite();
-    return;
+    progress.Update(done + got);
   }
-  for (unsigned long done = 0; done < bytes.size();) {
-    unsigned long n = std::min<unsigned long>(kPiece, bytes.size() - done);
-    bool ok = false;
-    if (t.form == TargetForm::kNorAddress) {
-      ok = flash->WriteToNORFlashAtAddr(t.address + done, bytes.data() + done, n);
-    } else if (t.medium == Medium::kNand) {
-      ok = flash->NANDWrite(bytes.data() + done, n, t.mtdName.c_str(), t.offset + done);
-    } else {
-      unsigned long base = 0;
-      const char* path = flash->LookupMTDPartition(t.mtdName.c_str(), &base);
-      ok = path != nullptr && flash->LinuxFlashWrite(path, base + t.offset + done, bytes.data() + done, n);
-    }
-    if (!ok) throw Failure("flash write: " + t.text + ": writing failed at " + Hex((t.form == TargetForm::kNorAddress ? t.address : t.offset) + done));
-    done += n;
-    progress.Update(done);
+  out.Flush();
+  if (!verify || back) return done;
+  input.Rewind();
+  TargetStream reader(t, false);
+  Progress checking("verifying " + t.text, done);
+  for (unsigned long checked = 0; checked < done;) {
+    unsigned long n = input.Read(piece.data(), std::min(kPiece, done - checked));
+    if (n == 0) throw Failure("flash write --verify: " + name + " changed while it was written");
+    VerifyPiece(reader, piece.data(), n, scratch, t, name);
+    checked += n;
+    checking.Update(checked);
   }
-  flash->NANDFlushWrite();
+  return done;
 }
 
 struct TransferArgs {
@@ -187,6 +303,7 @@ struct TransferArgs {
   bool mtd = false;
   bool yes = false;
   bool erase = false;
+  bool verify = false;
   std::string length;
 };
 
@@ -203,14 +320,47 @@ void RunRead(const TransferArgs& args) {
   } else {
     throw UsageError("flash read: give --length for " + t.text + " (its size is not known)");
   }
-  std::vector<unsigned char> bytes = ReadTarget(t, length);
   std::string output = args.file.empty() ? "-" : args.file;
-  if (output == "-" && isatty(1)) throw UsageError("flash read: give -o FILE (standard output is a terminal)");
-  WriteWholeFile(output, bytes);
+  if (output == "-" && isatty(STDOUT_FILENO))
+    throw UsageError("flash read: give -o FILE (standard output is a terminal)");
+  CommandFile sink(output, true);
+  TargetStream in(t, false);
+  std::vector<unsigned char> piece(std::min(kPiece, length));
+  Progress progress("reading " + t.text, length);
+  for (unsigned long done = 0; done < length;) {
+    unsigned long n = std::min(kPiece, length - done);
+    if (!in.Read(piece.data(), n)) throw Failure("flash read: " + t.text + ": reading failed at " + Hex(in.Position()));
+    sink.Write(piece.data(), n);
+    done += n;
+    progress.Update(done);
+  }
+  sink.Close();
+}
+
+// eMMC has no erase: a slot is filled with the erased value, piece by
+// piece, through the library's pattern fill.
+bool FillEmmcSlot(const Location& location, const std::string& label) {
+  unsigned long size = 0, offset = 0;
+  if (!ExtendedMemoryMapStructure::Instance()->GetSlotSizeAndOffset(&location, &size, &offset)) return false;
+  FlashInterface* flash = FlashInterface::Instance();
+  Progress progress(label, size);
+  for (unsigned long done = 0; done < size;) {
+    unsigned long n = std::min(kPiece, size - done);
+    Location slot = location;
+    if (!flash->EMMCErase(&slot, done, n, kErasedByte)) return false;
+    done += n;
+    progress.Update(done);
+  }
+  return true;
+}
+
+bool EraseLocation(const Location& location, const std::string& text) {
+  if (ExtendedMemoryMapStructure::Instance()->IsEMMCDevice(&location))
+    return FillEmmcSlot(location, "erasing " + text);
+  return FlashInterface::Instance()->EraseSlot(&location);
 }
 
 void EraseSlotOf(const Target& t, const std::string& command) {
-  FlashInterface* flash = FlashInterface::Instance();
   Location location;
   if (t.form == TargetForm::kLocation) {
     location = LocationOf(t.location);
@@ -220,22 +370,25 @@ void EraseSlotOf(const Target& t, const std::string& command) {
       throw UsageError(command + ": " + t.mtdName + " is not a slot; erase a slot by its location");
     location = LocationOf(arg);
   }
-  if (!flash->EraseSlot(&location)) throw Failure(command + ": erasing " + t.text + " failed");
+  if (!EraseLocation(location, t.text)) throw Failure(command + ": erasing " + t.text + " failed");
 }
 
 void RunWrite(const TransferArgs& args) {
   Target t = ParseTarget(args.target, args.mtd, "flash write");
-  std::vector<unsigned char> bytes = ReadWholeFile(args.file);
-  if (t.roomKnown && bytes.size() > t.room)
-    throw UsageError("flash write: " + args.file + " (" + std::to_string(bytes.size()) + " bytes) does not fit in " +
+  CommandFile input(args.file, false);
+  unsigned long size = 0;
+  bool sized = input.Size(&size);
+  if (sized && t.roomKnown && size > t.room)
+    throw UsageError("flash write: " + args.file + " (" + std::to_string(size) + " bytes) does not fit in " +
                      t.text + " (" + std::to_string(t.room) + " bytes left)");
   RequireYes(args.yes, "flash write", t);
   if (args.erase) {
     if (t.form == TargetForm::kNorAddress) throw UsageError("flash write --erase: erase by address with flash erase");
     EraseSlotOf(t, "flash write --erase");
   }
-  WriteTarget(t, bytes);
-  if (!Options().json) std::cerr << "wrote " << bytes.size() << " bytes to " << t.text << "\n";
+  unsigned long written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0);
+  if (!Options().json)
+    std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << "\n";
 }
 
 struct EraseArgs {
@@ -260,7 +413,7 @@ void RunErase(const EraseArgs& args, bool sectorOnly) {
   } else {
     if (t.location.hasOffset) throw UsageError(command + ": " + t.text + ": slots are erased whole, without an offset");
     Location location = LocationOf(t.location);
-    ok = sectorOnly ? flash->EraseSector(&location) : flash->EraseSlot(&location);
+    ok = sectorOnly ? flash->EraseSector(&location) : EraseLocation(location, t.text);
   }
   if (!ok) throw Failure(command + ": erasing " + t.text + " failed");
   if (!Options().json) std::cerr << "erased " << t.text << (sectorOnly ? " (first erase unit)" : "") << "\n";
@@ -320,6 +473,8 @@ void RegisterFlashCommands(CLI::App& app) {
   writeCommand->add_option("FILE", write.file, "Input file (- for standard input)")->required();
   writeCommand->add_flag("--mtd", write.mtd, "TARGET names an MTD partition");
   writeCommand->add_flag("--erase", write.erase, "Erase the whole slot first");
+  writeCommand->add_flag("--verify", write.verify,
+                         "Read back what was written and compare (standard input: piece by piece)");
   writeCommand->add_flag("-y,--yes", write.yes, "Confirm: change the device");
   SetAction(writeCommand, []() { RunWrite(write); });
 
