@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Installs the Debian packages that building and testing need, when missing.
 # Usage: deps.sh [group...]   groups: build (default), system, cross, tools,
-#                              system-arm64
+#                              system-arm64, bench
 set -euo pipefail
 groups=("${@:-build}")
 want=()
@@ -9,6 +9,7 @@ for g in "${groups[@]}"; do
   case "$g" in
     build)  want+=(cmake ninja-build g++ clang libgtest-dev libgmock-dev libbenchmark-dev zlib1g-dev pkg-config libclang-rt-14-dev) ;;
     tools)  want+=(libcli11-dev nlohmann-json3-dev) ;;
+    bench)  want+=(time) ;;
     system) want+=(qemu-system-x86 linux-image-amd64 busybox-static mtd-utils smartmontools hdparm cpio kmod xz-utils) ;;
     cross)  want+=(g++-aarch64-linux-gnu binutils-aarch64-linux-gnu qemu-user googletest) ;;
     system-arm64) want+=(qemu-system-arm make xz-utils kmod cpio) ;;
