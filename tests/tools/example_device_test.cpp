@@ -40,15 +40,4 @@ TEST(ExampleDevice, CheckedInFilesMatchTheGenerator) {
         << file << " differs; run examples/make-device.sh";
 }
 
-TEST(ExampleDevice, NandDumpMarksBlocksTwoAndFiveBad) {
-  ScratchDir reader;
-  std::vector<unsigned char> dump = reader.Read(kDevice + "/dev/mtd7");
-  const size_t page = 2048, oob = 64, pagesPerBlock = 64;
-  ASSERT_EQ(8 * pagesPerBlock * (page + oob), dump.size());
-  for (size_t block = 0; block < 8; ++block) {
-    unsigned char marker = dump[block * pagesPerBlock * (page + oob) + page];
-    EXPECT_EQ(block == 2 || block == 5, marker != 0xFF) << "block " << block;
-  }
-}
-
 }  // namespace

@@ -22,8 +22,6 @@ using stbplat::test::ToolRun;
 const std::string kDevice = std::string(STBPLAT_SOURCE_DIR) + "/examples/device";
 const std::string kNorImage = kDevice + "/dev/mtd8";
 constexpr unsigned long kFsblSlot = 0x10000;
-constexpr unsigned long kBuildSlot = 0x20000;
-constexpr unsigned long kPanelSlot = 0x30000;
 
 std::string At(unsigned long offset) {
   char text[32];
@@ -42,36 +40,6 @@ size_t Find(const std::vector<unsigned char>& bytes, const std::string& text, si
   return it == bytes.end() ? std::string::npos : static_cast<size_t>(it - bytes.begin());
 }
 
-TEST(RecordShow, DecodesTheBootLoaderRecordFromAnImage) {
-  ToolRun run = RunTool({"record", "show", kNorImage, "--at", At(kFsblSlot)});
-  ASSERT_EQ(0, run.exitCode) << run.err;
-  EXPECT_NE(std::string::npos, run.out.find("boot-loader information (FSBLInfo)")) << run.out;
-  EXPECT_NE(std::string::npos, run.out.find("description: \"FSBL 3.2c (example board)\"")) << run.out;
-  EXPECT_NE(std::string::npos, run.out.find("memoryControllers: 2")) << run.out;
-  EXPECT_NE(std::string::npos, run.out.find("scbClock: 432")) << run.out;
-  // The reload errors are shown by the library's own display, too.
-  EXPECT_NE(std::string::npos, run.out.find("as the library displays it:")) << run.out;
-  EXPECT_NE(std::string::npos, run.out.find("Error                = 0x0031")) << run.out;
-}
-
-TEST(RecordShow, JsonCarriesTheFieldsAsNumbers) {
-  ToolRun run = RunTool({"--json", "record", "show", kNorImage, "--at", At(kFsblSlot)});
-  ASSERT_EQ(0, run.exitCode) << run.err;
-  EXPECT_NE(std::string::npos, run.out.find("\"type\": \"fsbl\"")) << run.out;
-  EXPECT_NE(std::string::npos, run.out.find("\"segmentPhysicalAddressStart\": 1073741824")) << run.out;
-  EXPECT_NE(std::string::npos, run.out.find("\"status\": 0")) << run.out;
-}
-
-TEST(RecordShow, DetectsEachTypeFromItsCode) {
-  ToolRun build = RunTool({"record", "show", kNorImage, "--at", At(kBuildSlot)});
-  EXPECT_EQ(0, build.exitCode) << build.err;
-  EXPECT_NE(std::string::npos, build.out.find("(BuildConfig)")) << build.out;
-  EXPECT_NE(std::string::npos, build.out.find("gcc 12.2")) << build.out;
-  ToolRun panel = RunTool({"record", "show", kNorImage, "--at", At(kPanelSlot)});
-  EXPECT_EQ(0, panel.exitCode) << panel.err;
-  EXPECT_NE(std::string::npos, panel.out.find("AnimatedFrontPanelDisplayEntry text = HELLO FROM STBPLAT")) << panel.out;
-}
-
 TEST(RecordShow, ReadsStandardInput) {
   ScratchDir dir;
   ToolRun made = RunTool({"record", "make", "front-panel", "READY", "-o", dir / "panel.bin"});
@@ -80,27 +48,6 @@ TEST(RecordShow, ReadsStandardInput) {
   ToolRun run = RunTool({"record", "show", "-"}, std::string(bytes.begin(), bytes.end()));
   EXPECT_EQ(0, run.exitCode) << run.err;
   EXPECT_NE(std::string::npos, run.out.find("text: \"READY\"")) << run.out;
-}
-
-TEST(RecordShow, ErasedFlashHoldsNoRecord) {
-  // The NOR image's last sector past the front-panel record is erased.
-  ToolRun run = RunTool({"record", "show", kNorImage, "--at", "0x3F000"});
-  EXPECT_EQ(1, run.exitCode);
-  EXPECT_NE(std::string::npos, run.err.find("at 0x3F000 is erased")) << run.err;
-  ToolRun check = RunTool({"record", "check", kNorImage, "--at", "0x3F000"});
-  EXPECT_EQ(1, check.exitCode);
-}
-
-TEST(RecordShow, BadSourceAndTypeAreUsageErrors) {
-  ToolRun missing = RunTool({"record", "show", "no/such/file"});
-  EXPECT_EQ(2, missing.exitCode);
-  EXPECT_NE(std::string::npos, missing.err.find("'no/such/file'")) << missing.err;
-  ToolRun longName = RunTool({"record", "show", "NAND0.KERNELIMAGE.A"});
-  EXPECT_EQ(2, longName.exitCode);
-  EXPECT_NE(std::string::npos, longName.err.find("'KERNELIMAGE'")) << longName.err;
-  ToolRun type = RunTool({"record", "show", "--type", "nope", kNorImage});
-  EXPECT_EQ(2, type.exitCode);
-  EXPECT_NE(std::string::npos, type.err.find("--type nope")) << type.err;
 }
 
 TEST(RecordMake, VersionRecordReadsBackWithEveryField) {
@@ -133,27 +80,6 @@ TEST(RecordMake, PackageHeaderListsItsComponents) {
   EXPECT_NE(std::string::npos, shown.out.find("location: \"NAND0.KERNEL.A\"")) << shown.out;
   EXPECT_NE(std::string::npos, shown.out.find("slotOffset: 2048 (0x800)")) << shown.out;
   EXPECT_NE(std::string::npos, shown.out.find("Component 1:")) << shown.out;  // the library's display
-}
-
-TEST(RecordMake, RefusesBadArgumentsByName) {
-  ScratchDir dir;
-  ToolRun tag = RunTool({"record", "make", "package", "--header", "A.B.C", "-c", "TOOLONG=A.B.C", "-o", dir / "x"});
-  EXPECT_EQ(2, tag.exitCode);
-  EXPECT_NE(std::string::npos, tag.err.find("TOOLONG")) << tag.err;
-  ToolRun where = RunTool({"record", "make", "package", "--header", "nowhere", "-o", dir / "x"});
-  EXPECT_EQ(2, where.exitCode);
-  EXPECT_NE(std::string::npos, where.err.find("--header 'nowhere'")) << where.err;
-  ToolRun letter = RunTool({"record", "make", "version", "--letter", "ab", "-o", dir / "x"});
-  EXPECT_EQ(2, letter.exitCode);
-  EXPECT_NE(std::string::npos, letter.err.find("--letter 'ab'")) << letter.err;
-}
-
-TEST(RecordCheck, AcceptsEveryExampleRecord) {
-  for (unsigned long slot : {kFsblSlot, kBuildSlot, kPanelSlot}) {
-    ToolRun run = RunTool({"record", "check", kNorImage, "--at", At(slot)});
-    EXPECT_EQ(0, run.exitCode) << At(slot) << ": " << run.err;
-    EXPECT_EQ(0u, run.out.find("ok: ")) << run.out;
-  }
 }
 
 TEST(RecordCheck, NamesTheOffsetOfACorruptedNestedType) {
