@@ -3,6 +3,7 @@
 // row says so). "@" in an argument is the scratch folder with the inputs.
 #include <gtest/gtest.h>
 
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -56,6 +57,16 @@ const Row kRows[] = {
     {{"record", "check", kNor, "--at", "0x20000"}, 0, kOut, "ok: "},
     {{"record", "show", kNor, "--at", "0x3F000"}, 1, kErr, "at 0x3F000 is erased"},
     {{"record", "check", kNor, "--at", "0x3F000"}, 1, kErr, "is erased"},
+    // Records the tool makes read back with every field.
+    {{"record", "make", "version", "--major", "4", "--minor", "17", "--letter", "q", "--description", "nightly",
+      "--sequence", "MAIN", "--nv-sequence", "9", "-o", "@/vers.bin"}, 0, kExactOut, ""},
+    {{"--json", "record", "show", "@/vers.bin"}, 0, kOut, "\"minorVersion\": 17,"},
+    {{"--json", "record", "show", "@/vers.bin"}, 0, kOut, "\"versionLetter\": \"q\""},
+    {{"--json", "record", "show", "@/vers.bin"}, 0, kOut, "\"nvSequence\": 9"},
+    {{"record", "make", "package", "--header", "nand0.pkghdr.a", "--header-tag", "PKGH", "-c",
+      "KRNL=NAND0.KERNEL.A+0x800", "-c", "ROOT=NAND0.ROOTFS.A", "-o", "@/pkg.bin"}, 0, kExactOut, ""},
+    {{"record", "show", "--type", "package", "@/pkg.bin"}, 0, kOut, "slotOffset: 2048 (0x800)"},
+    {{"record", "show", "--type", "package", "@/pkg.bin"}, 0, kOut, "Component 1:"},  // the library's display
     // Conventions: help on every level; usage errors exit 2 naming the argument.
     {{"--help"}, 0, kOut, "Usage:"},
     {{"disk", "info", "--help"}, 0, kOut, "Usage:"},
@@ -71,6 +82,29 @@ const Row kRows[] = {
     {{"record", "make", "package", "--header", "nowhere", "-o", "@/x"}, 2, kErr, "--header 'nowhere'"},
     {{"record", "make", "version", "--letter", "ab", "-o", "@/x"}, 2, kErr, "--letter 'ab'"},
     {{"flash", "read", "not-a-target"}, 2, kErr, "'not-a-target'"},
+    // The example device in host mode ("@/device", a copy).
+    {{"--root", "@/device", "mtd", "list"}, 0, kOut,
+     "mtd5   NAND0.KERNEL.A       NAND     512 KiB    128 KiB    2 KiB    1"},
+    {{"--root", "@/device", "mtd", "list"}, 0, kOut,
+     "mtd7   NAND0...             NAND       1 MiB    128 KiB    2 KiB    2  (whole chip)"},
+    {{"--root", "@/device", "--json", "mtd", "list"}, 0, kOut, "\"eraseSize\": 65536"},
+    {{"--root", "@/device", "map"}, 0, kOut, "bad blocks: 2 (at 0x40000) 5 (at 0xA0000)"},
+    {{"--root", "@/device", "map"}, 0, kOut, "EMMC0  EMMC 1 MiB"},
+    {{"--root", "@/device", "--json", "map"}, 0, kOut, "\"badBlocks\": [\n        262144,\n        655360\n      ]"},
+    {{"--root", "@/device", "map", "--svg", "@/map.svg"}, 0, kOut, "NOR0  SPI_NOR 256 KiB at 0xE0000000"},
+    {{"--root", "@/device", "record", "show", "NOR0.FSBLINFO.A"}, 0, kOut, "FSBL 3.2c (example board)"},
+    // ROOTFS.A starts on a bad block: the record comes from the next one.
+    {{"--root", "@/device", "record", "show", "NAND0.ROOTFS.A"}, 0, kOut, "root file system 2026.11b"},
+    {{"--root", "@/device", "record", "show", "EMMC0.APPS.B"}, 0, kOut, "applications 1.3c"},
+    {{"--root", "@/device", "record", "check", "NAND0.PKGHDR.A"}, 0, kOut, "ok: "},
+    {{"--root", "@/device", "flash", "read", "0xE0010000", "-n", "4", "-o", "-"}, 0, kExactOut, "FSBL"},
+    {{"--root", "@/device", "flash", "read", "--mtd", "NAND0.KERNEL.A", "-n", "4"}, 0, kExactOut, "VERS"},
+    {{"--root", "@/device", "flash", "erase", "NOR0.BOOT.A"}, 2, kErr, "add --yes to go ahead"},
+    {{"--root", "@/device", "flash", "erase", "NOR0.NOPE.A", "--yes"}, 1, kErr, "NOR0.NOPE.A"},
+    {{"--root", "@/device", "flash", "read", "NOR0.BOOT.A", "-n", "1M", "-o", "@/x"}, 2, kErr,
+     "--length 1M runs past the end of NOR0.BOOT.A (65536 bytes left)"},
+    {{"--root", "@/device", "flash", "write", "NOR0.BOOT.A", "@/long.bin", "--yes"}, 2, kErr,
+     "(70000 bytes) does not fit in NOR0.BOOT.A (65536 bytes left)"},
 };
 
 std::string Expand(std::string text, const std::string& dir) {
@@ -80,6 +114,8 @@ std::string Expand(std::string text, const std::string& dir) {
 
 TEST(Commands, AnswerEachRow) {
   ScratchDir dir;
+  std::filesystem::copy(std::string(STBPLAT_SOURCE_DIR) + "/examples/device", dir / "device",
+                        std::filesystem::copy_options::recursive);
   dir.Write("check.txt", "123456789");
   dir.Write("long.bin", std::string(70000, 'a'));
   dir.Write("dump.bin", std::string("ABCDEFGHIJKLMNOPQ\0\x7f", 19));

@@ -4,7 +4,6 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <cstdio>
 #include <cstdlib>
 #include <stdexcept>
 
@@ -12,21 +11,6 @@
 
 namespace stbplat {
 namespace test {
-namespace {
-
-std::string Slurp(const std::string& path) {
-  std::string text;
-  FILE* file = std::fopen(path.c_str(), "rb");
-  if (file == nullptr) return text;
-  char buffer[4096];
-  size_t got;
-  while ((got = std::fread(buffer, 1, sizeof buffer, file)) > 0) text.append(buffer, got);
-  std::fclose(file);
-  return text;
-}
-
-}  // namespace
-
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input,
                 const std::vector<std::string>& env) {
   ScratchDir scratch;
@@ -56,8 +40,9 @@ ToolRun RunTool(const std::vector<std::string>& args, const std::string& input,
   waitpid(child, &status, 0);
   ToolRun run;
   run.exitCode = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
-  run.out = Slurp(out);
-  run.err = Slurp(err);
+  std::vector<unsigned char> printed = scratch.Read("stdout"), complained = scratch.Read("stderr");
+  run.out.assign(printed.begin(), printed.end());
+  run.err.assign(complained.begin(), complained.end());
   return run;
 }
 
