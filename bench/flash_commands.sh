@@ -83,8 +83,10 @@ row() {  # label, reference label, command..., --, reference command...
   rows+=("| \`$label\` | $cs s | $((ck / 1024)) MiB | \`$reflabel\`: $rs s, $((rk / 1024)) MiB | $(awk -v a="$cs" -v b="$rs" 'BEGIN{printf (b > 0 ? "%.2f" : "-"), a / b}') |")
 }
 
-row "flash read NAND0.ROOTFS.A -o out (256 MiB slot, 3 bad blocks)" "cat IMAGE > /dev/null" \
-  "$tool" --root "$root" flash read NAND0.ROOTFS.A -o "$work/out" -- cat "$root/dev/mtd1"
+row "flash read NAND0.ROOTFS.A -o /dev/null (256 MiB slot, 3 bad blocks)" "cat IMAGE > /dev/null" \
+  "$tool" --root "$root" flash read NAND0.ROOTFS.A -o /dev/null -- cat "$root/dev/mtd1"
+row "flash read NAND0.ROOTFS.A -o out" "cat IMAGE > out" \
+  "$tool" --root "$root" flash read NAND0.ROOTFS.A -o "$work/out" -- sh -c "cat '$root/dev/mtd1' >'$work/out'"
 row "flash read EMMC0.APPS.A --length 0x40000000 -o out (1 GiB)" "dd bs=1M count=1024 of=out" \
   "$tool" --root "$root" flash read EMMC0.APPS.A --length 0x40000000 -o "$work/out" -- \
   dd if="$root/dev/mmca" of="$work/out" bs=1M count=1024 status=none

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/uio.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -21,6 +22,8 @@ constexpr unsigned char kErased = 0xFF;
 constexpr size_t kBadMarkerByte = 0;
 constexpr unsigned char kBadMarker = 0x00;
 constexpr size_t kChunk = 64 * 1024;
+// Pages read at once from an image with OOB bytes.
+constexpr uint64_t kSpanPages = 64;
 
 std::string BadListPath(const std::string& imagePath) { return imagePath + ".bad"; }
 
@@ -69,8 +72,22 @@ std::unique_ptr<FlashImage> FlashImage::Open(const std::string& path, const Geom
     return nullptr;
   }
   std::unique_ptr<FlashImage> image(new FlashImage(fd, path, geometry, withOob));
+  if (geometry.medium == Medium::kNand && geometry.eraseSize != 0)
+    image->badBlocks_.assign(geometry.size / geometry.eraseSize, false);
   if (geometry.medium == Medium::kNand && !withOob && !image->LoadBadList(error)) return nullptr;
+  if (withOob && geometry.eraseSize != 0) image->LoadBadMarkers();
   return image;
+}
+
+// The library asks for every block from the start of the device for each
+// block it touches: the markers are read once here, not from the file on
+// every question.
+void FlashImage::LoadBadMarkers() {
+  for (uint64_t block = 0; block < geometry_.size / geometry_.eraseSize; ++block) {
+    unsigned char marker = kErased;
+    off_t where = static_cast<off_t>(FileOffset(block * geometry_.eraseSize) + geometry_.writeSize + kBadMarkerByte);
+    if (pread(fd_, &marker, 1, where) != 1 || marker != kErased) badBlocks_[block] = true;
+  }
 }
 
 bool FlashImage::LoadBadList(std::string* error) {
@@ -90,7 +107,7 @@ bool FlashImage::LoadBadList(std::string* error) {
       *error = BadListPath(path_) + ":" + std::to_string(lineNumber) + ": not a block number of this image";
       return false;
     }
-    badBlocks_.insert(block);
+    badBlocks_[block] = true;
   }
   return true;
 }
@@ -99,7 +116,8 @@ int FlashImage::SaveBadList() const {
   std::ofstream out(BadListPath(path_), std::ios::trunc);
   if (!out) return EIO;
   out << "# bad blocks of " << path_.substr(path_.find_last_of('/') + 1) << ", one block number a line\n";
-  for (uint64_t block : badBlocks_) out << block << "\n";
+  for (uint64_t block = 0; block < badBlocks_.size(); ++block)
+    if (badBlocks_[block]) out << block << "\n";
   return out ? 0 : EIO;
 }
 
@@ -111,14 +129,29 @@ uint64_t FlashImage::FileOffset(uint64_t dataOffset) const {
 
 int FlashImage::RawRead(uint64_t dataOffset, void* buffer, size_t length) const {
   unsigned char* out = static_cast<unsigned char*>(buffer);
+  if (!hasOob_) return pread(fd_, out, length, static_cast<off_t>(dataOffset)) == static_cast<ssize_t>(length) ? 0 : EIO;
+  // A span of pages is read in one system call, each page's data going
+  // straight to the caller and its OOB bytes to a scratch area: one call
+  // per page would be the bottleneck.
+  const uint64_t page = geometry_.writeSize;
+  std::vector<unsigned char> oob(geometry_.oobSize);
+  struct iovec parts[2 * kSpanPages];
   while (length > 0) {
-    size_t n = length;
-    if (hasOob_) n = std::min<uint64_t>(n, geometry_.writeSize - dataOffset % geometry_.writeSize);
-    ssize_t got = pread(fd_, out, n, static_cast<off_t>(FileOffset(dataOffset)));
-    if (got != static_cast<ssize_t>(n)) return EIO;
-    out += n;
-    dataOffset += n;
-    length -= n;
+    off_t where = static_cast<off_t>(FileOffset(dataOffset));
+    size_t count = 0, total = 0;
+    for (uint64_t within = dataOffset % page; count < 2 * kSpanPages && length > 0; within = 0) {
+      size_t n = std::min<uint64_t>(length, page - within);
+      parts[count++] = {out, n};
+      total += n;
+      out += n;
+      dataOffset += n;
+      length -= n;
+      if (length > 0) {
+        parts[count++] = {oob.data(), oob.size()};
+        total += oob.size();
+      }
+    }
+    if (preadv(fd_, parts, static_cast<int>(count), where) != static_cast<ssize_t>(total)) return EIO;
   }
   return 0;
 }
@@ -188,32 +221,27 @@ int FlashImage::Erase(uint64_t offset, uint64_t length) {
 bool FlashImage::IsBad(uint64_t offset) const {
   if (geometry_.medium != Medium::kNand || geometry_.eraseSize == 0) return false;
   uint64_t block = offset / geometry_.eraseSize;
-  if (!hasOob_) return badBlocks_.count(block) != 0;
-  unsigned char marker = kErased;
-  off_t where = static_cast<off_t>(FileOffset(block * geometry_.eraseSize) + geometry_.writeSize +
-                                   kBadMarkerByte);
-  if (pread(fd_, &marker, 1, where) != 1) return true;
-  return marker != kErased;
+  return block < badBlocks_.size() && badBlocks_[block];
 }
 
 int FlashImage::MarkBad(uint64_t offset) {
   if (geometry_.medium != Medium::kNand) return EOPNOTSUPP;
   uint64_t block = offset / geometry_.eraseSize;
-  if (!hasOob_) {
-    badBlocks_.insert(block);
-    return SaveBadList();
-  }
+  if (block >= badBlocks_.size()) return EINVAL;
+  badBlocks_[block] = true;
+  if (!hasOob_) return SaveBadList();
   off_t where = static_cast<off_t>(FileOffset(block * geometry_.eraseSize) + geometry_.writeSize +
                                    kBadMarkerByte);
   return pwrite(fd_, &kBadMarker, 1, where) == 1 ? 0 : EIO;
 }
 
 unsigned FlashImage::BadBlocksIn(uint64_t offset, uint64_t length) const {
-  if (geometry_.medium != Medium::kNand) return 0;
-  unsigned count = 0;
-  for (uint64_t at = offset; at < offset + length; at += geometry_.eraseSize)
-    if (IsBad(at)) ++count;
-  return count;
+  if (geometry_.medium != Medium::kNand || geometry_.eraseSize == 0) return 0;
+  uint64_t first = offset / geometry_.eraseSize, end = (offset + length) / geometry_.eraseSize;
+  end = std::min<uint64_t>(end, badBlocks_.size());
+  return first < end ? static_cast<unsigned>(std::count(badBlocks_.begin() + static_cast<long>(first),
+                                                        badBlocks_.begin() + static_cast<long>(end), true))
+                     : 0;
 }
 
 }  // namespace hostsim

@@ -15,7 +15,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
-#include <set>
+#include <vector>
 #include <string>
 
 namespace stbplat {
@@ -60,13 +60,16 @@ class FlashImage {
   int RawRead(uint64_t dataOffset, void* buffer, size_t length) const;
   int RawWrite(uint64_t dataOffset, const void* data, size_t length);
   bool LoadBadList(std::string* error);
+  void LoadBadMarkers();
   int SaveBadList() const;
 
   int fd_;
   std::string path_;
   Geometry geometry_;
   bool hasOob_;
-  std::set<uint64_t> badBlocks_;  // block numbers, plain NAND images only
+  // Block numbers: a plain image's list, or the markers of a dump with OOB
+  // bytes as they stood at the open, kept up to date by MarkBad.
+  std::vector<bool> badBlocks_;
 };
 
 }  // namespace hostsim
