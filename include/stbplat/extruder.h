@@ -75,9 +75,9 @@ class STBPLAT_EXPORT Extruder {
 
   unsigned int count();
   void SetLength(unsigned int newLength);
-  bool IsUsingStdin() const;
-  bool Is64Address() const;
-  void Display() const;
+  bool IsUsingStdin();
+  bool Is64Address();
+  void Display();
 
   unsigned int extrude(bool* value);
   unsigned int extrude(unsigned short* value);

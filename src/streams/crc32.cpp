@@ -2,6 +2,8 @@
 // polynomial table and explicit bit reversals.
 #include "stbplat/crc.h"
 
+#include <atomic>
+
 namespace {
 
 constexpr unsigned int kPolynomial = 0x04C11DB7u;
@@ -10,9 +12,11 @@ constexpr unsigned int kBitsPerByte = 8;
 constexpr unsigned int kTopByteShift = 24;
 constexpr unsigned int kByteMask = 0xFFu;
 
-// Built on first use; two threads racing here build identical contents.
+// Built on first use. Two threads racing here build identical contents;
+// the flag is published with release and read with acquire, so a thread that
+// sees it set also sees every entry, on weakly ordered CPUs too.
 unsigned int crc32Table[256];
-bool crc32TableBuilt = false;
+std::atomic<bool> crc32TableBuilt{false};
 
 void BuildCrc32Table() {
   for (unsigned int i = 0; i < 256; ++i) {
@@ -21,7 +25,7 @@ void BuildCrc32Table() {
       entry = (entry & kTopBit) != 0 ? (entry << 1) ^ kPolynomial : entry << 1;
     crc32Table[i] = entry;
   }
-  crc32TableBuilt = true;
+  crc32TableBuilt.store(true, std::memory_order_release);
 }
 
 // The low `bits` bits of value in reverse order.
@@ -39,7 +43,7 @@ unsigned int reverse(unsigned int value, unsigned int bits) {
 extern "C" {
 
 unsigned int CRC32Enet(unsigned int crc, const unsigned char* data, unsigned int count) {
-  if (!crc32TableBuilt) BuildCrc32Table();
+  if (!crc32TableBuilt.load(std::memory_order_acquire)) BuildCrc32Table();
   for (unsigned int i = 0; i < count; ++i) {
     unsigned int r = reverse(data[i], kBitsPerByte);
     crc = (crc << kBitsPerByte) ^ crc32Table[((crc >> kTopByteShift) ^ r) & kByteMask];

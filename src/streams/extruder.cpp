@@ -153,11 +153,11 @@ void Extruder::SetLength(unsigned int newLength) {
   length = newLength;
 }
 
-bool Extruder::IsUsingStdin() const { return pFile == stdin; }
+bool Extruder::IsUsingStdin() { return pFile == stdin; }
 
-bool Extruder::Is64Address() const { return is64Address; }
+bool Extruder::Is64Address() { return is64Address; }
 
-void Extruder::Display() const {
+void Extruder::Display() {
   constexpr auto kModule = eLogModuleByteStreams;
   constexpr auto kLevel = eLogLevelDisplay;
   STBPLAT_LOG(kModule, kLevel, kExtruderSource, "Display", "Extruder info:\r\n");
