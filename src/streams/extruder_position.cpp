@@ -20,16 +20,25 @@ unsigned int Low32(const unsigned char* p) {
   return static_cast<unsigned int>(reinterpret_cast<std::uintptr_t>(p));
 }
 
+// Filler bytes go out in pieces of this size: memory stays bounded however
+// far the stream is moved.
+constexpr unsigned int kFillerPiece = 64 * 1024;
+
 // Moving forward in a file that cannot seek (or past what it allows) writes
-// filler bytes instead: streams opened for writing extend their file so.
+// filler bytes instead: streams opened for writing extend their file so. It
+// stops at the first piece the file does not take.
 void ExtendByWriting(FILE* file, unsigned int n) {
-  std::unique_ptr<unsigned char[]> filler(new (std::nothrow) unsigned char[n]());
+  std::unique_ptr<unsigned char[]> filler(new (std::nothrow) unsigned char[kFillerPiece]());
   if (!filler) {
     STBPLAT_LOG(kModule, eLogLevelAllocation, kExtruderSource, "operator+=",
                 "Memory allocation failure\r\n");
     return;
   }
-  Sys().fwrite(filler.get(), 1, n, file);
+  while (n > 0) {
+    const unsigned int piece = n < kFillerPiece ? n : kFillerPiece;
+    if (Sys().fwrite(filler.get(), 1, piece, file) != piece) return;
+    n -= piece;
+  }
 }
 
 }  // namespace
