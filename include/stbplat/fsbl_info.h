@@ -11,7 +11,8 @@
 // every record whose major version is 0, as all known producers write.
 // Safe edges on corrupt input: the count is trusted only while entry headers
 // can be read and skipped; a header that cannot be read, or a skip past the
-// end of a memory stream, stops the loop with 0xA012.
+// end of a memory stream or a file (a NOR partition, a slot file), stops the
+// loop with 0xA012 without moving, allocating or writing anything.
 #ifndef STBPLAT_FSBL_INFO_H
 #define STBPLAT_FSBL_INFO_H
 

@@ -21,18 +21,25 @@ inline bool Intruded(unsigned int result) {
   return result == kIntrudeOk || result == kIntrudeFull;
 }
 
-// Stream positions as integers. A memory stream's position is its offset
-// from pStart, so that positions noted before a growable buffer moves stay
-// valid; other 32-bit streams carry an offset in the pointer value; 64-bit
-// streams have their own offset.
+// Stream positions as integers, through the operations that really move
+// the stream in its mode: getP64/setP64 on NAND and eMMC (their running
+// device offset), getP/setP everywhere else, including the other 64-bit
+// streams (a NOR component or slot file moves its file position, physical
+// memory its pointer), where getP64/setP64 would not move. A memory
+// stream's position is its offset from pStart, so that positions noted
+// before a growable buffer moves stay valid.
 unsigned long Position(Extruder& in);
 bool SetPosition(Extruder& in, unsigned long position);
+
+// True for the modes positioned by getP64/setP64 (NAND, eMMC).
+bool MovesBy64(const Extruder& in);
 
 // Only a memory stream knows for certain how many bytes are left.
 bool IsMemoryStream(const Extruder& in);
 
-// Moves forward n bytes. Refuses (without moving) when a memory stream holds
-// fewer than n bytes, so that callers looping over a corrupt count stop at
+// Moves forward n bytes. Refuses (without moving) when a memory stream or a
+// file holds fewer than n bytes, so that a size read from flash never makes
+// a skip allocate or write, and callers looping over a corrupt count stop at
 // the stream's end.
 bool Skip(Extruder& in, unsigned long n);
 

@@ -116,10 +116,14 @@ unsigned int SystemDescriptor::StoreTLVAndData(Intruder* out) const {
     return kDescriptorFieldError;
   }
   // The size is known only once the payload is written: leave room for it.
+  // A growable buffer grows first (the skip itself never grows it); growth
+  // moves the write position to the buffer's old end, so it is put back.
   const unsigned long sizeField = Position(*out);
-  *out += kSizeFieldBytes;
+  const bool room = !IsMemoryStream(*out) || out->bytesLeft >= kSizeFieldBytes ||
+                    (out->verify(kSizeFieldBytes) == 0 && SetPosition(*out, sizeField));
+  if (room) *out += kSizeFieldBytes;
   const unsigned long dataStart = Position(*out);
-  if (StoreDescriptor(out) != kDescriptorOk) {
+  if (!room || StoreDescriptor(out) != kDescriptorOk) {
     RECORD_ERROR("StoreTLVAndData", "Insufficient memory to add entry of type %c%c%c%c\r\n",
                  RECORD_TYPE_CHARS(entryType));
     SetPosition(*out, entryStart);

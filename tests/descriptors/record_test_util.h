@@ -86,32 +86,6 @@ inline Bytes Data(const std::string& text) {
   return bytes;
 }
 
-// A memory stream that reports 64-bit positions: getP64/setP64 map onto
-// the buffer offset, so that the records' 64-bit paths can be driven and
-// observed without a device.
-template <typename Stream, typename Buffer>
-class Memory64Stream : public Stream {
- public:
-  Memory64Stream(Buffer buffer, unsigned int size) : Stream(buffer, size) {
-    this->is64Address = true;
-  }
-  unsigned long getP64() override {
-    ++getP64Calls;
-    return static_cast<unsigned long>(this->pCurrent - this->pStart);
-  }
-  bool setP64(unsigned long offset) override {
-    ++setP64Calls;
-    if (offset > this->length) return false;
-    return this->setP(const_cast<unsigned char*>(this->pStart) + offset);
-  }
-  int getP64Calls = 0;
-  int setP64Calls = 0;
-};
-
-using Memory64Extruder = Memory64Stream<Extruder, const unsigned char*>;
-// The writing twin of Memory64Extruder.
-using Memory64Intruder = Memory64Stream<Intruder, unsigned char*>;
-
 }  // namespace records_test
 
 #endif

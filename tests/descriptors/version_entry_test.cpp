@@ -92,19 +92,6 @@ TEST(VersionEntry, EntryEndingBehindPadTakesLetterAndPadOnly) {
   EXPECT_EQ(in.bytesLeft, 4u);
 }
 
-TEST(VersionEntry, OptionalFieldsAreMeasuredOnSixtyFourBitStreamsToo) {
-  Bytes bytes = Golden("vers_to_pad.bin");
-  Append(bytes, {0x11, 0x22, 0x33, 0x44});
-  Memory64Extruder in(bytes.data(), static_cast<unsigned int>(bytes.size()));
-  VersionEntry v;
-  ASSERT_EQ(v.ReadTLVAndData(in, nullptr), 0u);
-  EXPECT_EQ(v.versionLetter, 'a');
-  EXPECT_EQ(v.pad, 0x5A);
-  EXPECT_EQ(v.sequenceControl.otpEpoch, 0x40000000u);
-  EXPECT_EQ(in.bytesLeft, 4u);
-  EXPECT_GE(in.getP64Calls, 3);
-}
-
 TEST(VersionEntry, ShortRecordStoredAgainGainsTheOptionalFields) {
   const Bytes golden = Golden("vers_no_tail.bin");
   Extruder in(golden.data(), static_cast<unsigned int>(golden.size()));

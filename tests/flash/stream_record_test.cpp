@@ -1,16 +1,16 @@
-// Records stored through a stream on a flash component read back equal,
-// on NOR, on NAND across a bad block, and on eMMC. A package header writes
-// its fields in order and goes straight to the device. A framed record
-// back-patches its size field, which flash cannot take in place (NAND
-// writes whole pages in order; NOR streams do not move their 64-bit
-// position), so it is stored into memory first and its bytes are written
-// to the device in one piece.
+// Records on every stream a component location opens: NOR, a slot file,
+// physical memory, NAND (its slot starting on a bad block) and eMMC. The
+// framing leaves each stream exactly behind every entry, whatever the
+// reader consumed; where the medium takes a back-patched size (NOR, slot
+// files, memory), a record is stored in place and reads back equal.
 #include <cstring>
 #include <string>
 
+#include "descriptors/record_test_util.h"
 #include "flash_fixture.h"
-#include "stbplat/code_object_info.h"
 #include "stbplat/component_location.h"
+#include "stbplat/data_entry.h"
+#include "stbplat/fsbl_info.h"
 #include "stbplat/intruder.h"
 #include "stbplat/version_entry.h"
 
@@ -18,92 +18,145 @@ namespace stbplat {
 namespace test {
 namespace {
 
+using records_test::Append;
+using records_test::Bytes;
+using records_test::PutU32;
+
 struct Place {
   const char* device;
   const char* partition;
   const char* slot;
   unsigned long offset;
+  bool takesBackPatch;  // false: NAND writes pages in order, eMMC whole pages
 };
 
-class StreamRecordTest : public FlashTest, public testing::WithParamInterface<Place> {
- protected:
-  ComponentLocation Component() const {
-    ComponentLocation component;
-    component.location = MakeLocation(GetParam().device, GetParam().partition, GetParam().slot);
-    component.slotOffset = GetParam().offset;
-    return component;
-  }
+const Place kPlaces[] = {
+    {"NOR0", "BOOT", "CONFIG", 0x20, true}, {"FS0", "CFG", "USER", 0x10, true},
+    {"SDRAM0", "RESV", "ARGS", 0x10, true}, {"NAND0", "SYS", "DATA", 0, false},
+    {"EMMC0", "APP", "STORE", 0x800, false},
 };
 
-VersionEntry SampleVersion() {
-  VersionEntry v;
-  v.majorVersion = 7;
-  v.minorVersion = 42;
-  static const char kText[] = "kernel 7.42 (flash round trip)";
-  v.description.CreateData(sizeof kText, reinterpret_cast<const unsigned char*>(kText));
-  v.versionLetter = 'c';
-  std::memcpy(v.sequenceControl.controlledSequenceName, "stable", 6);
-  v.sequenceControl.nvSequence = 9;
-  return v;
+ComponentLocation At(const Place& place) {
+  ComponentLocation component;
+  component.location = MakeLocation(place.device, place.partition, place.slot);
+  component.slotOffset = place.offset;
+  return component;
 }
 
-CodeObjectInfo SamplePackage() {
-  CodeObjectInfo info;
-  info.unused = 0x1234;
-  info.packageHeaderLocation.location = MakeLocation("NOR0", "BOOT", "CONFIG");
-  info.numComponents = 3;
-  for (unsigned int i = 0; i < info.numComponents; ++i) {
-    std::memcpy(info.componentLocations[i].componentTag, "CMP0", 4);
-    info.componentLocations[i].componentTag[3] = static_cast<unsigned char>('0' + i);
-    info.componentLocations[i].location = MakeLocation("NAND0", "SYS", "DATA");
-    info.componentLocations[i].slotOffset = 0x1000ul * (i + 1);
-  }
-  return info;
+void PutHeader(Bytes& bytes, const char* type, unsigned int size) {
+  bytes.insert(bytes.end(), type, type + 4);
+  PutU32(bytes, size);
+  Append(bytes, {0, 0, 0, 2});  // flags 0, major 0, minor 2
 }
 
-TEST_P(StreamRecordTest, VersionAndPackageHeaderReadBackEqual) {
-  sim_.MarkBad(kNandData, 0);  // the NAND slot starts on a bad block
-  const ComponentLocation component = Component();
-  const VersionEntry version = SampleVersion();
-  const CodeObjectInfo package = SamplePackage();
-  {
-    Intruder framed(256u, 0u);
-    ASSERT_EQ(version.StoreTLVAndData(&framed), 0u);
-    Intruder out(&component);
-    ASSERT_TRUE(out.isInitedOK);
-    ASSERT_EQ(out.intrude(framed.pStart, static_cast<unsigned int>(framed.pCurrent - framed.pStart)), 1u);
-    ASSERT_EQ(package.Store(&out), 0u);
-  }
+// An older VERS that ends behind its description; a newer one with four
+// bytes behind its sequence control that no reader knows; a DATA entry.
+Bytes ThreeEntries() {
+  Bytes bytes;
+  PutHeader(bytes, "VERS", 4 + 6 + 8 + 3);
+  Append(bytes, {0, 1, 0, 2, 0, 0});
+  Append(bytes, records_test::Data("old"));
+  PutHeader(bytes, "VERS", 4 + 6 + 8 + 1 + 2 + 28 + 4);
+  Append(bytes, {0, 3, 0, 4, 0, 0});
+  Append(bytes, records_test::Data("n"));
+  Append(bytes, {'z', 0});
+  Append(bytes, Bytes(20, 'S'));
+  PutU32(bytes, 0x40000001);
+  PutU32(bytes, 5);
+  Append(bytes, {0xDE, 0xAD, 0xBE, 0xEF});
+  Append(bytes, records_test::Data("end"));
+  return bytes;
+}
+
+void WriteRaw(const ComponentLocation& component, const Bytes& bytes) {
+  Intruder out(&component);
+  ASSERT_TRUE(out.isInitedOK);
+  ASSERT_LE(out.intrude(bytes.data(), static_cast<unsigned int>(bytes.size())), 2u);
   FlashInterface::Instance()->NANDFlushWrite();
-
-  Extruder in(&component, false);
-  ASSERT_TRUE(in.isInitedOK);
-  VersionEntry versionBack;
-  ASSERT_EQ(versionBack.ReadTLVAndData(in, nullptr), 0u);
-  EXPECT_EQ(versionBack.majorVersion, 7);
-  EXPECT_EQ(versionBack.minorVersion, 42);
-  EXPECT_TRUE(versionBack.description == version.description);
-  EXPECT_EQ(versionBack.versionLetter, 'c');
-  EXPECT_EQ(std::memcmp(versionBack.sequenceControl.controlledSequenceName, "stable", 6), 0);
-  EXPECT_EQ(versionBack.sequenceControl.nvSequence, 9u);
-
-  CodeObjectInfo packageBack;
-  ASSERT_EQ(packageBack.Read(in), 0u);
-  EXPECT_EQ(packageBack.unused, 0x1234);
-  EXPECT_TRUE(packageBack.packageHeaderLocation == package.packageHeaderLocation);
-  ASSERT_EQ(packageBack.numComponents, 3u);
-  for (unsigned int i = 0; i < 3; ++i)
-    EXPECT_TRUE(packageBack.componentLocations[i] == package.componentLocations[i]) << i;
-  EXPECT_EQ(sim_.OpenCount(), 1) << "only the reading stream's file is open";
 }
 
-INSTANTIATE_TEST_SUITE_P(Media, StreamRecordTest,
-                         testing::Values(Place{"NOR0", "BOOT", "CONFIG", 0x20},
-                                         Place{"NAND0", "SYS", "DATA", 0},
-                                         Place{"EMMC0", "APP", "STORE", 0x800}),
-                         [](const testing::TestParamInfo<Place>& param) {
-                           return std::string(param.param.device);
-                         });
+class RecordStreams : public FlashTest {
+ protected:
+  void SetUp() override {
+    FlashTest::SetUp();
+    sim_.MarkBad(kNandData, 0);
+  }
+};
+
+TEST_F(RecordStreams, FramingKeepsEveryStreamBehindEachEntry) {
+  for (const Place& place : kPlaces) {
+    SCOPED_TRACE(place.device);
+    const ComponentLocation component = At(place);
+    WriteRaw(component, ThreeEntries());
+    Extruder in(&component, false);
+    ASSERT_TRUE(in.isInitedOK);
+    VersionEntry older, newer;
+    ASSERT_EQ(older.ReadTLVAndData(in, nullptr), 0u);
+    EXPECT_EQ(older.versionLetter, 0);
+    EXPECT_EQ(older.sequenceControl.otpEpoch, 0x40000000u);
+    ASSERT_EQ(newer.ReadTLVAndData(in, nullptr), 0u);
+    EXPECT_EQ(newer.versionLetter, 'z');
+    EXPECT_EQ(newer.sequenceControl.nvSequence, 5u);
+    // In place is refused on these 64-bit streams, which stay behind the
+    // entry's header; the payload is then read as an owned copy.
+    DataEntry last;
+    unsigned int length = 0;
+    ASSERT_EQ(last.ReadTLVAndData(in, &length, true), 0xA006u);
+    in -= 8;
+    ASSERT_EQ(last.ReadTLVAndData(in, &length, false), 0u);
+    EXPECT_EQ(length, 3u);
+    EXPECT_EQ(std::memcmp(last.GetData(), "end", 3), 0);
+  }
+}
+
+TEST_F(RecordStreams, RecordsStoredInPlaceReadBackEqual) {
+  VersionEntry version;
+  version.majorVersion = 7;
+  version.description.CreateData(5, reinterpret_cast<const unsigned char*>("k7.42"));
+  version.versionLetter = 'c';
+  version.sequenceControl.nvSequence = 9;
+  for (const Place& place : kPlaces) {
+    if (!place.takesBackPatch) continue;
+    SCOPED_TRACE(place.device);
+    const ComponentLocation component = At(place);
+    {
+      Intruder out(&component);
+      ASSERT_TRUE(out.isInitedOK);
+      ASSERT_EQ(version.StoreTLVAndData(&out), 0u);
+      ASSERT_EQ(version.StoreTLVAndData(&out), 0u);
+    }
+    Extruder in(&component, false);
+    for (int copy = 0; copy < 2; ++copy) {
+      VersionEntry back;
+      ASSERT_EQ(back.ReadTLVAndData(in, nullptr), 0u) << copy;
+      EXPECT_EQ(back.majorVersion, 7);
+      EXPECT_TRUE(back.description == version.description);
+      EXPECT_EQ(back.sequenceControl.nvSequence, 9u);
+    }
+  }
+}
+
+TEST_F(RecordStreams, PaddingSizedPastTheFlashIsNotSkippedByWriting) {
+  // On a NOR partition, which refuses a seek past its end.
+  Bytes vers;
+  PutHeader(vers, "VERS", 4 + 6 + 8);
+  Append(vers, {0, 1, 0, 0, 0, 0});
+  Append(vers, records_test::Data(""));
+  Bytes bytes = {'F', 'S', 'B', 'L'};
+  PutU32(bytes, static_cast<unsigned int>(4 + vers.size() + 4 + 8));
+  Append(bytes, {0, 0, 0, 0});
+  Append(bytes, vers);
+  PutU32(bytes, 1);
+  Append(bytes, {'P', 'A', 'D', 'D'});
+  PutU32(bytes, 0x7FFFFFF0);
+  const ComponentLocation component = At(kPlaces[0]);
+  WriteRaw(component, bytes);
+  const std::vector<uint8_t> before = sim_.Bytes("/dev/mtd1", 0, 0x40000);
+  Extruder in(&component, false);
+  FSBLInfo info;
+  EXPECT_EQ(info.ReadTLVAndData(in, nullptr), 0xA012u);
+  EXPECT_TRUE(sim_.Bytes("/dev/mtd1", 0, 0x40000) == before);
+}
 
 }  // namespace
 }  // namespace test
