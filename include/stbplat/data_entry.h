@@ -16,6 +16,10 @@
 //   when it starts with a zero) and leaves the payload unchanged.
 // - operator== and DisplayAsText reach an offset-only payload through its
 //   source stream, never through the offset as an address.
+// - A failed ReadInPlace leaves no payload (null, length 0), never the old
+//   length over the new source.
+// - StoreTLVAndData copies an offset-only payload through its source stream
+//   in pieces (and puts the source back), never through the offset.
 // - GetInPlaceData without a source stream, or whose source cannot be
 //   positioned at the payload, returns false.
 // - Allocation failures are reported ("Memory allocation failure"), never

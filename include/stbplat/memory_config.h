@@ -3,9 +3,11 @@
 // minor version 6; both layouts are read, decided by the minor version in
 // the record's own header, and the new one is always written.
 //
-// Kept on purpose: Store writes the header's minor version as it was read,
-// so a minor-5 record stored again carries minor 5 in front of the new
-// layout.
+// A minor-5 controller or segment is converted as it is read: minorVer then
+// says 6, the layout the record holds and stores, so that what a store
+// writes reads back to the same controller and segments.
+// A failing segment is removed from its controller's list again; a failing
+// controller stays in the configuration's list as its read left it.
 // Safe edges on corrupt input: element counts are trusted only as far as
 // elements read; the first element that fails (at the latest, the stream's
 // end) stops the loop, and lists grow per element read, never by the count.

@@ -29,7 +29,7 @@ unsigned int BseckReloadDescriptor::Read(Extruder& in, unsigned int) {
     RECORD_ERROR("Read", "Error reading numReloadError\r\n");
     return kDescriptorFieldError;
   }
-  const unsigned int result = ReadList(numReloadError, ReloadErrors,
+  const unsigned int result = ReadList(numReloadError, ReloadErrors, FailedElement::kDropped,
                                        [&in](BseckReloadError& error) { return error.Read(in); });
   if (result != kDescriptorOk) RECORD_ERROR("Read", "Error reading ReloadErrors\r\n");
   return result;

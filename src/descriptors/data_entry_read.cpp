@@ -74,7 +74,13 @@ unsigned int DataEntry::ReadInPlace(Extruder& in, unsigned int newLength) {
   source = &in;
   pPayload = in.getP();
   const std::uintptr_t end = reinterpret_cast<std::uintptr_t>(pPayload) + newLength;
-  if (!in.setP(reinterpret_cast<unsigned char*>(end))) return kDescriptorWrongType;
+  if (!in.setP(reinterpret_cast<unsigned char*>(end))) {
+    // No payload rather than the old length over the new source.
+    pPayload = nullptr;
+    source = nullptr;
+    length = 0;
+    return kDescriptorWrongType;
+  }
   length = newLength;
   return kDescriptorOk;
 }

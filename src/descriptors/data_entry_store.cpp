@@ -1,5 +1,6 @@
 // DataEntry: writing a DATA entry, and copying an in-place payload out of
 // its source stream.
+#include "descriptors/data_entry_payload.h"
 #include "descriptors/record_io.h"
 #include "stbplat/data_entry.h"
 #include "stbplat/system_descriptor.h"
@@ -22,7 +23,17 @@ unsigned int DataEntry::StoreTLVAndData(Intruder* out) const {
     return kDescriptorFieldError;
   }
   if (pPayload == nullptr) return kDescriptorOk;
-  if (!Intruded(out->intrude(pPayload, length))) {
+  // A payload left in a file or device holds only its offset there: it is
+  // copied from its source in pieces, and the source is put back.
+  bool stored = false;
+  if (HoldsOffsetOnly(*this)) {
+    unsigned char* const saved = source->getP();
+    stored = GetInPlaceData(out);
+    source->setP(saved);
+  } else {
+    stored = Intruded(out->intrude(pPayload, length));
+  }
+  if (!stored) {
     RECORD_ERROR("StoreTLVAndData", "Error writing pPayload\r\n");
     return kDescriptorFieldError;
   }

@@ -30,7 +30,7 @@ unsigned int MemoryConfigDescriptor::Read(Extruder& in, unsigned int) {
     return kDescriptorFieldError;
   }
   const unsigned int result =
-      ReadList(numControllers, memoryControllers, [&in](MemoryControllerDescriptor& controller) {
+      ReadList(numControllers, memoryControllers, FailedElement::kKept, [&in](MemoryControllerDescriptor& controller) {
         return controller.ReadTLVAndData(in, nullptr);
       });
   if (result != kDescriptorOk) RECORD_ERROR("Read", "Error reading memoryControllers\r\n");

@@ -11,7 +11,7 @@ constexpr unsigned char kMcetMajorVersion = 0;
 unsigned int ReadSegments(Extruder& in, unsigned long count,
                           std::vector<MemoryControllerSegmentDescriptor>& segments) {
   const unsigned int result =
-      ReadList(count, segments, [&in](MemoryControllerSegmentDescriptor& segment) {
+      ReadList(count, segments, FailedElement::kDropped, [&in](MemoryControllerSegmentDescriptor& segment) {
         return segment.ReadTLVAndData(in, nullptr);
       });
   if (result != kDescriptorOk) RECORD_ERROR("Read", "Error reading memorySegments\r\n");
@@ -49,6 +49,8 @@ unsigned int MemoryControllerDescriptor::Read(Extruder& in, unsigned int) {
     // as not valid.
     ddrCfgWidth = ddrSize = ddrSpeed = ddrDevTech = ddrMode = ddrDevWidth = 0;
     valid = false;
+    // What the record holds now has the new layout, and is stored so.
+    minorVer = kMemoryLayoutMinorVersion;
     return kDescriptorOk;
   }
   if (!Extruded(in.extrude(&ddrCfgWidth))) {

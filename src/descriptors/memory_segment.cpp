@@ -26,7 +26,11 @@ unsigned int MemoryControllerSegmentDescriptor::Read(Extruder& in, unsigned int)
     RECORD_ERROR("Read", "Error reading segmentSize\r\n");
     return kDescriptorFieldError;
   }
-  if (minorVer < kMemoryLayoutMinorVersion) segmentSize >>= kBytesToMiBShift;
+  if (minorVer < kMemoryLayoutMinorVersion) {
+    segmentSize >>= kBytesToMiBShift;
+    // What the record holds now has the new layout, and is stored so.
+    minorVer = kMemoryLayoutMinorVersion;
+  }
   return kDescriptorOk;
 }
 

@@ -9,18 +9,22 @@
 namespace stbplat {
 namespace records {
 
+// What becomes of the element whose read failed.
+enum class FailedElement { kDropped, kKept };
+
 // Empties list, then reads up to count elements with readOne(element),
-// appending each. The first failing element is dropped again (earlier ones
-// stay) and its status returned. The list grows only by elements actually
-// read, so a corrupt count costs no more than the stream holds.
+// appending each. The first failing element ends the read with its status;
+// it is dropped again or kept as it was left (earlier ones stay). The list
+// grows only by elements actually read, so a corrupt count costs no more
+// than the stream holds.
 template <typename T, typename ReadOne>
-unsigned int ReadList(unsigned long count, std::vector<T>& list, ReadOne readOne) {
+unsigned int ReadList(unsigned long count, std::vector<T>& list, FailedElement failed, ReadOne readOne) {
   list.clear();
   for (unsigned long i = 0; i < count; ++i) {
     list.emplace_back();
     const unsigned int result = readOne(list.back());
     if (result != kDescriptorOk) {
-      list.pop_back();
+      if (failed == FailedElement::kDropped) list.pop_back();
       return result;
     }
   }

@@ -118,29 +118,22 @@ TEST(DataEntryInPlace, MemoryPayloadStaysInTheBuffer) {
   EXPECT_TRUE(copy == e);
 }
 
-TEST(DataEntryInPlace, RefusedOnSixtyFourBitStreamsBehindTheHeader) {
-  Bytes bytes = Data("abcd");
-  bytes.push_back(0);
-  Memory64Extruder in(bytes.data(), static_cast<unsigned int>(bytes.size()));
+TEST(DataEntryInPlace, PayloadPastTheStreamIsRefusedAndLeavesNoPayload) {
+  // A reused entry: a good read first, then a corrupt length elsewhere.
+  Bytes good = Data("abcdefgh");
+  Extruder first(good.data(), static_cast<unsigned int>(good.size()));
   DataEntry e;
-  EXPECT_EQ(e.ReadTLVAndData(in, nullptr, true), 0xA006u);
-  EXPECT_EQ(Offset(in), 8u);
-  EXPECT_EQ(e.GetData(), nullptr);
-  // Owned payloads are still read.
-  in.setP64(0);
-  EXPECT_EQ(e.ReadTLVAndData(in, nullptr, false), 0u);
-  EXPECT_EQ(PayloadString(e), "abcd");
-  EXPECT_GE(in.setP64Calls, 2);
-  EXPECT_EQ(Offset(in), 12u);
-}
-
-TEST(DataEntryInPlace, PayloadPastTheStreamIsRefused) {
+  ASSERT_EQ(e.ReadTLVAndData(first, nullptr, true), 0u);
   Bytes bytes = Data("abcd");
   bytes[7] = 9;
   Extruder in(bytes.data(), static_cast<unsigned int>(bytes.size()));
-  DataEntry e;
   // The in-place skip fails, and so does the repositioning behind it.
   EXPECT_EQ(e.ReadTLVAndData(in, nullptr, true), 0xA012u);
+  EXPECT_EQ(e.length, 0u);
+  EXPECT_EQ(e.GetData(), nullptr);
+  DataEntry copy;
+  copy = e;  // nothing to read past
+  EXPECT_EQ(copy.length, 0u);
 }
 
 Bytes Pattern(size_t n) {
@@ -241,6 +234,14 @@ TEST(DataEntryInPlace, FileSourceIsReachedThroughTheStream) {
   copy = e;
   EXPECT_EQ(PayloadString(copy), "from a file");
   EXPECT_TRUE(copy == e);
+
+  // Stored, the payload is taken through the file, which is put back.
+  in.setP(reinterpret_cast<unsigned char*>(1));
+  Bytes stored(8 + 11);
+  Intruder entry(stored.data(), static_cast<unsigned int>(stored.size()));
+  EXPECT_EQ(e.StoreTLVAndData(&entry), 0u);
+  EXPECT_EQ(stored, Data("from a file"));
+  EXPECT_EQ(in.getP(), reinterpret_cast<unsigned char*>(1));
 
   LogCapture capture;
   e.DisplayAsText();

@@ -57,7 +57,8 @@ TEST(MemoryConfig, MinorFiveLayoutReadsInMiBAndMarksControllersInvalid) {
   ASSERT_EQ(config.memoryControllers.size(), 1u);
   const MemoryControllerDescriptor& c = config.memoryControllers[0];
   EXPECT_FALSE(c.valid);
-  EXPECT_EQ(c.minorVer, 5);
+  EXPECT_EQ(c.minorVer, 6);  // converted as read
+  EXPECT_EQ(c.memorySegments[0].minorVer, 6);
   EXPECT_EQ(c.ddrCfgWidth + c.ddrSize + c.ddrSpeed + c.ddrDevTech + c.ddrMode + c.ddrDevWidth, 0);
   ASSERT_EQ(c.memorySegments.size(), 2u);
   EXPECT_EQ(c.memorySegments[0].segmentSize, 256u);  // 0x10000000 bytes
@@ -66,7 +67,7 @@ TEST(MemoryConfig, MinorFiveLayoutReadsInMiBAndMarksControllersInvalid) {
   EXPECT_TRUE(c.memorySegments[0].valid);
 }
 
-TEST(MemoryConfig, MinorFiveControllerIsStoredInTheNewLayout) {
+TEST(MemoryConfig, MinorFiveControllerIsStoredInTheNewLayoutAndReadsBackEqual) {
   const Bytes golden = Golden("mcfg_minor5.bin");
   Extruder in(golden.data(), static_cast<unsigned int>(golden.size()));
   MemoryConfigDescriptor config;
@@ -74,13 +75,19 @@ TEST(MemoryConfig, MinorFiveControllerIsStoredInTheNewLayout) {
   Bytes buffer(256);
   Intruder out(buffer.data(), 256);
   ASSERT_EQ(config.memoryControllers[0].StoreTLVAndData(&out), 0u);
-  // The header keeps the minor version read (5); the payload is the new
-  // layout: six zero DDR fields, a 16-bit count, sizes in MiB.
+  // The header says the layout written: six zero DDR fields, a 16-bit
+  // count, sizes in MiB.
   Bytes payload(12, 0);
   PutU16(payload, 2);
-  Append(payload, Segment(0x40000000, 256, 5));
-  Append(payload, Segment(0x60000000, 3, 5));
-  EXPECT_EQ(Written(out), Entry("MCET", payload, 0, 5));
+  Append(payload, Segment(0x40000000, 256, 6));
+  Append(payload, Segment(0x60000000, 3, 6));
+  EXPECT_EQ(Written(out), Entry("MCET", payload, 0, 6));
+  Extruder back(buffer.data(), 256);
+  MemoryControllerDescriptor again;
+  ASSERT_EQ(again.ReadTLVAndData(back, nullptr), 0u);
+  ASSERT_EQ(again.memorySegments.size(), 2u);
+  EXPECT_EQ(again.memorySegments[1].segmentSize, 3u);
+  EXPECT_EQ(again.memorySegments[1].segmentPhysicalAddressStart, 0x60000000ul);
 }
 
 TEST(MemorySegment, SizeShiftDependsOnTheMinorVersion) {
@@ -162,7 +169,7 @@ TEST(MemoryConfig, FailingControllerAndFieldMessages) {
   MemoryConfigDescriptor config;
   LogCapture capture;
   EXPECT_EQ(config.ReadTLVAndData(in, nullptr), 0xA004u);
-  EXPECT_EQ(config.memoryControllers.size(), 1u);
+  EXPECT_EQ(config.memoryControllers.size(), 2u);  // the failing controller stays
   EXPECT_EQ(RecordTexts(capture).back(), "Error reading memoryControllers\r\n");
   EXPECT_EQ(in.bytesLeft, 0u);
 
