@@ -2,11 +2,16 @@
 # Compares the dynamic symbols that a shared library defines with the
 # checked-in list of its interface (every file in a folder, one demangled
 # symbol a line). A renamed, retyped, missing or extra export fails.
-#   check-exports.sh LIBRARY LIST_DIR [NM]
+# With the platform library and the list of what may be taken from it, also
+# checks the library's imports from the platform library against that list
+# (names without parameters), so that it loads beside the device's own.
+#   check-exports.sh LIBRARY LIST_DIR [NM [PLATFORM_LIBRARY IMPORT_LIST]]
 set -euo pipefail
 lib=$1
 list_dir=$2
 nm_tool=${3:-nm}
+platform=${4:-}
+imports=${5:-}
 
 expected=$(mktemp) actual=$(mktemp)
 trap 'rm -f "$expected" "$actual"' EXIT
@@ -29,3 +34,15 @@ if ! diff -u --label expected --label "$lib" "$expected" "$actual"; then
   exit 1
 fi
 echo "check-exports: $(wc -l <"$actual") symbols match"
+
+[ -n "$platform" ] || exit 0
+names() { sed -E -e 's/^[0-9a-fA-F]* *[A-Za-z] +//' -e 's/\(.*$//' | LC_ALL=C sort -u; }
+offered=$("$nm_tool" -DC --defined-only "$platform" | names)
+taken=$("$nm_tool" -DC --undefined-only "$lib" | names | LC_ALL=C comm -12 - <(echo "$offered"))
+extra=$(LC_ALL=C comm -23 <(echo "$taken") <(sed -e '/^#/d' -e '/^$/d' "$imports" | LC_ALL=C sort -u))
+if [ -n "$extra" ]; then
+  echo "check-exports: $(basename "$lib") takes from $(basename "$platform") what the platform's list does not hold:" >&2
+  echo "$extra" >&2
+  exit 1
+fi
+echo "check-exports: $(echo "$taken" | wc -l) platform imports, all on the list"

@@ -13,11 +13,20 @@
 // - a measured erase or page size of 0 is not taken over (the default stays),
 //   and NAND operations refuse to run with a NAND block size of 0 (no NAND
 //   device) or without a page buffer, instead of looping or dividing by 0;
+//   erasing a NAND slot or sector then fails with a message, since nothing
+//   was erased;
+// - the partial-page buffer belongs to one device and one page: a NANDWrite
+//   to another device, or of whole pages elsewhere, writes it out first; a
+//   write inside another page is refused; never more than nandPageSize bytes
+//   come from it;
 // - an eMMC chunk rounded up past the end of the caller's data is completed
 //   with the bytes the device already holds there, not with bytes read past
 //   the caller's buffer;
 // - a /proc/mtd line that does not parse, or with a negative number, is
 //   skipped.
+// Only the platform library's listed functions are imported: a file slot's
+// path comes from GetMTDorFileName, and the NAND device's base address for
+// the old-kernel fallback from the record GetDevice returns (physBase).
 #ifndef STBPLAT_FLASH_INTERFACE_H
 #define STBPLAT_FLASH_INTERFACE_H
 

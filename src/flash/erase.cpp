@@ -59,7 +59,8 @@ bool FlashInterface::EraseSlot(const Location* location) {
   std::string name = NameOf(location);
   if (map->IsSlotAFile(location)) {
     FLASH_LOG(eLogLevelTrace, "EraseSlot", "Erasing file slot %s\r\n", name.c_str());
-    const char* file = map->GetSlotFileName(location);
+    unsigned long extraOffset = 0;
+    const char* file = map->GetMTDorFileName(location, &extraOffset);
     if (file == nullptr) {
       FLASH_LOG(eLogLevelError, "EraseSlot", "Unable to retrieve file name for %s\r\n",
                 name.c_str());
@@ -157,8 +158,12 @@ bool FlashInterface::EraseNANDSlot(const char* path) {
               path);
     return false;
   }
-  // A block size of 0 (no NAND device) would never advance.
-  if (nandSectorSize == 0) return true;
+  // A block size of 0 (no NAND device in the memory map) erases nothing:
+  // say so rather than report an erase that did not happen.
+  if (nandSectorSize == 0) {
+    FLASH_LOG(eLogLevelError, "EraseNANDSlot", "EraseNANDSlot: no NAND block size, %s not erased\n", path);
+    return false;
+  }
   for (unsigned long offset = 0; offset < size; offset += nandSectorSize) {
     if (BlockState(fd.get(), offset) != 0) continue;
     if (!EraseNandBlock(fd.get(), offset, nandSectorSize)) continue;
@@ -176,6 +181,11 @@ bool FlashInterface::EraseNANDSector(const char* path) {
   if (fd.get() == -1) {
     FLASH_LOG(eLogLevelError, "EraseNANDSector",
               "EraseNANDSector: open of mtd partition %s failed\n", path);
+    return false;
+  }
+  if (nandSectorSize == 0) {
+    FLASH_LOG(eLogLevelError, "EraseNANDSector", "EraseNANDSector: no NAND block size, %s not erased\n",
+              path);
     return false;
   }
   if (BlockState(fd.get(), 0) != 0) return true;

@@ -51,12 +51,14 @@ const char* FlashInterface::FindOldKernelNANDmtdNameAndAdjustOffset(const char* 
   if (row < 0 || name == nullptr) return nullptr;
   ExtendedMemoryMapStructure* map = ExtendedMemoryMapStructure::Instance();
   Location location;
-  unsigned long base = 0;
   unsigned long slotAddress = 0;
-  if (!map->GetLocation(name, &location) || !map->GetDeviceBaseAddress(&location, 0, &base) ||
-      !map->GetPhysAddressFromLocation(&location, 0, &slotAddress, nullptr))
+  if (!map->GetLocation(name, &location)) return nullptr;
+  // The device's base address is the one its memory-map record holds (one
+  // chip per device name, so index 0).
+  const MemoryDeviceEntry* device = map->GetDevice(&location);
+  if (device == nullptr || !map->GetPhysAddressFromLocation(&location, 0, &slotAddress, nullptr))
     return nullptr;
-  offset += slotAddress - base;
+  offset += slotAddress - device->physBase;
   return mtdDeviceNames[row];
 }
 
@@ -106,10 +108,16 @@ bool FlashInterface::NANDWrite(const unsigned char* buffer, unsigned long length
     FLASH_LOG(eLogLevelError, "NANDWrite", "NANDWrite: LookupMTDPartition for %s failed\r\n", name);
     return false;
   }
+  // The buffered partial page belongs to its own device: a write to another
+  // one writes it out first.
+  if (currNANDBufferOffset != 0 &&
+      (pendingNANDDevice == nullptr || std::strcmp(pendingNANDDevice, path) != 0))
+    NANDFlushWrite();
   int failures = 0;
   blocksMarkedBad = 0;
   while (length != 0) {
     unsigned long physical = 0;
+    bool fromBuffer = false;
     // Without a page buffer or page size no partial page can be handled.
     if (nandPageBuffer == nullptr || nandPageSize == 0 ||
         !ValidBlockOffset(path, offset, physical)) {
@@ -126,7 +134,9 @@ bool FlashInterface::NANDWrite(const unsigned char* buffer, unsigned long length
                   "NANDWrite: writing in the middle of a block and currNANDBufferOffset == 0\r\n");
         return false;
       }
-      if (physical % nandPageSize != currNANDBufferOffset) {
+      // Only the bytes that follow the buffered ones on their page continue it.
+      if (physical % nandPageSize != currNANDBufferOffset ||
+          offset != pendingNANDOffset + currNANDBufferOffset) {
         FLASH_LOG(eLogLevelError, "NANDWrite",
                   "NANDWrite: writing in the middle of a block and write start doesn't align with "
                   "currNANDBufferOffset\r\n");
@@ -140,6 +150,7 @@ bool FlashInterface::NANDWrite(const unsigned char* buffer, unsigned long length
       physical -= currNANDBufferOffset;
       chunk = nandPageSize;
       std::memcpy(nandPageBuffer + currNANDBufferOffset, buffer, nandPageSize - currNANDBufferOffset);
+      fromBuffer = true;
     } else if (chunk % nandPageSize != 0) {
       if (chunk < nandPageSize) {
         if (currNANDBufferOffset != 0) {
@@ -155,7 +166,11 @@ bool FlashInterface::NANDWrite(const unsigned char* buffer, unsigned long length
       }
       chunk -= chunk % nandPageSize;
     }
-    const unsigned char* source = currNANDBufferOffset != 0 ? nandPageBuffer : buffer;
+    // Whole pages elsewhere come from the caller: the buffered page is
+    // written out first, at its own place.
+    if (!fromBuffer && currNANDBufferOffset != 0) NANDFlushWrite();
+    // Only the completed page itself ever comes from the buffer.
+    const unsigned char* source = fromBuffer ? nandPageBuffer : buffer;
     if (!LinuxFlashWrite(path, physical, source, chunk)) {
       if (++failures > kMaxNandWriteFailures) {
         FLASH_LOG(eLogLevelError, "NANDWrite", "NANDWrite: too many bad blocks, aborting\r\n");
@@ -167,12 +182,12 @@ bool FlashInterface::NANDWrite(const unsigned char* buffer, unsigned long length
       if (!HandleBadNANDBlock(path, physical)) break;
       continue;
     }
-    unsigned long taken = chunk - currNANDBufferOffset;
+    unsigned long taken = fromBuffer ? chunk - currNANDBufferOffset : chunk;
     offset += taken;
     buffer += taken;
     failures = 0;
     length = taken > length ? 0 : length - taken;
-    if (currNANDBufferOffset != 0) ClearPending(*this);
+    if (fromBuffer) ClearPending(*this);
   }
   return length == 0;
 }

@@ -1,6 +1,7 @@
 # The shared library's exports are exactly the checked-in interface.
 add_test(NAME abi.exported_symbols
   COMMAND ${PROJECT_SOURCE_DIR}/scripts/check-exports.sh $<TARGET_FILE:stbplat>
-          ${PROJECT_SOURCE_DIR}/tests/abi/exports ${CMAKE_NM})
+          ${PROJECT_SOURCE_DIR}/tests/abi/exports ${CMAKE_NM}
+          $<TARGET_FILE:stbplat_platform> ${PROJECT_SOURCE_DIR}/tests/abi/platform-imports.txt)
 add_test(NAME abi.os_seam_discipline
   COMMAND ${PROJECT_SOURCE_DIR}/scripts/check-seam.sh ${PROJECT_SOURCE_DIR})

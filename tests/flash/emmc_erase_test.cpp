@@ -118,6 +118,15 @@ TEST_F(EraseTest, NorSlotErasesWholeSectorsOnly) {
   EXPECT_TRUE(log.Contains("Device XYZ.A.B not found\r\n"));
 }
 
+TEST_F(EraseTest, NorSlotEraseStopsAtTheFirstSectorThatFails) {
+  FlashInterface& flash = Flash();
+  Location config = MakeLocation("NOR0", "BOOT", "CONFIG");
+  sim_.ClearHistory();
+  sim_.FailCall(SimCall::kOpen, 2, EIO);  // the second sector's device
+  EXPECT_FALSE(flash.EraseSlot(&config));
+  EXPECT_EQ(sim_.Erases("/dev/mtd1").size(), 1u);
+}
+
 TEST_F(EraseTest, NandSlotErasesGoodBlocksAndMarksEioFailures) {
   FlashInterface& flash = Flash();
   sim_.MarkBad(kNandData, kNandBlock);

@@ -55,6 +55,8 @@ TEST_F(PartitionTableTest, CountFollowsTheLastLineAndHighNumbersAreIgnored) {
 TEST_F(PartitionTableTest, DefaultsAndMeasuredSizes) {
   LogCapture log;
   FlashInterface& flash = Flash();
+  EXPECT_EQ(FlashInterface::Instance(), &flash);  // one object, made once
+  EXPECT_FALSE(log.Contains("Memory allocation failure"));
   EXPECT_EQ(flash.norSectorSize, kNorSector);
   EXPECT_EQ(flash.nandSectorSize, kNandBlock);
   EXPECT_EQ(flash.nandPageSize, kNandPage);
@@ -98,6 +100,14 @@ TEST_F(PartitionTableTest, WithoutNandDeviceThereIsNoNandGeometry) {
   EXPECT_FALSE(flash.ValidBlockOffset(kNandData, 0, physical));
   unsigned char byte = 0;
   EXPECT_FALSE(flash.NANDWrite(&byte, 1, "NAND0.SYS.DATA", 0));
+  // Erasing without a block size erases nothing, and says so.
+  LogCapture log;
+  sim_.ClearHistory();
+  EXPECT_FALSE(flash.EraseNANDSlot(kNandData));
+  EXPECT_FALSE(flash.EraseNANDSector(kNandData));
+  EXPECT_TRUE(log.Contains("EraseNANDSlot: no NAND block size, /dev/mtd2 not erased\n"));
+  EXPECT_TRUE(log.Contains("EraseNANDSector: no NAND block size, /dev/mtd2 not erased\n"));
+  EXPECT_TRUE(sim_.Erases(kNandData).empty());
 }
 
 TEST_F(PartitionTableTest, NorOpenFailureIsReportedAndDefaultKept) {
