@@ -71,8 +71,8 @@ measure() { /usr/bin/time -f '%e %M' -o "$work/time" "$@" >/dev/null 2>"$work/er
   cat "$work/err" >&2; exit 1; }; cat "$work/time"; }
 
 rows=()
-row() {  # label, reference label, command..., --, reference command...
-  local label=$1 reflabel=$2; shift 2
+row() {  # label, reference label, bar (peak KiB below, most time ratio or -), command..., --, reference command...
+  local label=$1 reflabel=$2 barkib=$3 barratio=$4; shift 4
   local cmd=() ref=()
   while [ "$1" != -- ]; do cmd+=("$1"); shift; done; shift
   ref=("$@")
@@ -80,22 +80,31 @@ row() {  # label, reference label, command..., --, reference command...
   r=$(measure "${ref[@]}"); r=$(measure "${ref[@]}")   # the second with a warm cache
   c=$(measure "${cmd[@]}")
   read -r cs ck <<<"$c"; read -r rs rk <<<"$r"
-  rows+=("| \`$label\` | $cs s | $((ck / 1024)) MiB | \`$reflabel\`: $rs s, $((rk / 1024)) MiB | $(awk -v a="$cs" -v b="$rs" 'BEGIN{printf (b > 0 ? "%.2f" : "-"), a / b}') |")
+  rows+=("$(awk -v l="$label" -v rl="$reflabel" -v cs="$cs" -v ck="$ck" -v rs="$rs" -v rk="$rk" \
+    -v bk="$barkib" -v br="$barratio" 'BEGIN {
+      ratio = rs > 0 ? cs / rs : 0
+      bar = sprintf("peak < %d MiB: %s", bk / 1024, ck < bk ? "met" : "MISSED")
+      if (br != "-") bar = bar sprintf("; time <= %s x: %s", br, rs > 0 && ratio <= br ? "met" : "MISSED")
+      shown = rs > 0 ? sprintf("%.2f", ratio) : "-"
+      printf("| `%s` | %.2f s | %.1f MiB | `%s`: %.2f s, %.1f MiB | %s | %s |", l, cs, ck / 1024, rl, rs, rk / 1024,
+        shown, bar) }')")
 }
 
-row "flash read NAND0.ROOTFS.A -o /dev/null (256 MiB slot, 3 bad blocks)" "cat IMAGE > /dev/null" \
+bar=$((32 * 1024))
+row "flash read NAND0.ROOTFS.A -o /dev/null (256 MiB slot, 3 bad blocks)" "cat IMAGE > /dev/null" $bar 3 \
   "$tool" --root "$root" flash read NAND0.ROOTFS.A -o /dev/null -- cat "$root/dev/mtd1"
-row "flash read NAND0.ROOTFS.A -o out" "cat IMAGE > out" \
+row "flash read NAND0.ROOTFS.A -o out" "cat IMAGE > out" $bar - \
   "$tool" --root "$root" flash read NAND0.ROOTFS.A -o "$work/out" -- sh -c "cat '$root/dev/mtd1' >'$work/out'"
-row "flash read EMMC0.APPS.A --length 0x40000000 -o out (1 GiB)" "dd bs=1M count=1024 of=out" \
+row "flash read EMMC0.APPS.A --length 0x40000000 -o out (1 GiB)" "dd bs=1M count=1024 of=out" $bar 2 \
   "$tool" --root "$root" flash read EMMC0.APPS.A --length 0x40000000 -o "$work/out" -- \
   dd if="$root/dev/mmca" of="$work/out" bs=1M count=1024 status=none
-row "flash write NAND0.ROOTFS.A in.bin --erase --verify --yes (200 MiB)" "cat in.bin" \
+row "flash write NAND0.ROOTFS.A in.bin --erase --verify --yes (200 MiB)" "cat in.bin > /dev/null" $bar - \
   "$tool" --root "$root" flash write NAND0.ROOTFS.A "$work/in.bin" --erase --verify --yes -- cat "$work/in.bin"
 cmp <("$tool" --root "$root" flash read NAND0.ROOTFS.A --length $((200 * mib)) -o -) "$work/in.bin"
 
-table=$(printf '%s\n' "| Command | Time | Peak memory | Reference (same bytes, warm cache) | Ratio |" \
-  "|---|---|---|---|---|" "${rows[@]}")
+table=$(printf '%s\n' "Host mode, $(date -u '+%Y-%m-%d %H:%M UTC'), commit $(git rev-parse --short HEAD):" "" \
+  "| Command | Time | Peak memory | Reference (same bytes, warm cache) | Ratio | Bars |" \
+  "|---|---|---|---|---|---|" "${rows[@]}")
 printf '%s\n' "$table"
 python3 - "$table" <<'PY'
 import re, sys

@@ -181,7 +181,10 @@ if want tool.whole_partition; then
   s=tool.whole_partition
   good=$((63 * BLOCK))
   dd if=/dev/urandom of=/tmp/whole bs=$BLOCK count=63 2>/dev/null
-  peak() { sed -n 's/.*Maximum resident set size (kbytes): //p' /tmp/time.$1; }
+  # busybox time counts ru_maxrss (KiB) as pages and multiplies by the page
+  # size in KiB: divide it back out.
+  page_kib=$(sed -n 's/^KernelPageSize: *\([0-9]*\) kB/\1/p' /proc/self/smaps | head -n 1)
+  peak() { echo $(($(sed -n 's/.*Maximum resident set size (kbytes): //p' /tmp/time.$1) / page_kib)); }
   check $s "flash write --verify" busybox time -v -o /tmp/time.w \
     $STBPLAT flash write --erase --verify --yes NAND0.ROOTFS.A /tmp/whole
   check $s "flash read" busybox time -v -o /tmp/time.r $STBPLAT flash read NAND0.ROOTFS.A -o /tmp/whole.read

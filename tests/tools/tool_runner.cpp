@@ -11,8 +11,7 @@
 
 namespace stbplat {
 namespace test {
-ToolRun RunTool(const std::vector<std::string>& args, const std::string& input,
-                const std::vector<std::string>& env) {
+ToolRun RunTool(const std::vector<std::string>& args, const std::string& input) {
   ScratchDir scratch;
   std::string in = scratch.Write("stdin", input);
   std::string out = scratch / "stdout";
@@ -28,7 +27,6 @@ ToolRun RunTool(const std::vector<std::string>& args, const std::string& input,
     dup2(errFd, 2);
     unsetenv("STBPLAT_ROOT");
     unsetenv("STBPLAT_LOG_LEVEL");
-    for (const std::string& assignment : env) putenv(const_cast<char*>(assignment.c_str()));
     std::vector<char*> argv;
     argv.push_back(const_cast<char*>(STBPLAT_TOOL_PATH));
     for (const std::string& arg : args) argv.push_back(const_cast<char*>(arg.c_str()));

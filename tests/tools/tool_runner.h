@@ -16,10 +16,8 @@ struct ToolRun {
 };
 
 // args are passed as they are (no shell); input, when given, is the
-// program's standard input. STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared
-// unless env sets them ("NAME=value" entries).
-ToolRun RunTool(const std::vector<std::string>& args, const std::string& input = "",
-                const std::vector<std::string>& env = {});
+// program's standard input. STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared.
+ToolRun RunTool(const std::vector<std::string>& args, const std::string& input = "");
 
 }  // namespace test
 }  // namespace stbplat
