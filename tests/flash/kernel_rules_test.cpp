@@ -143,6 +143,46 @@ TEST_F(KernelRulesTest, MarkingABadBlockAgainCountsAgain) {
   EXPECT_EQ(errno, EIO);
 }
 
+TEST_F(KernelRulesTest, MarkingBadErasesTheBlockFirst) {
+  ASSERT_EQ(WriteAt(2 * kNandBlock, std::vector<uint8_t>(kNandPage, 0x00)), static_cast<long>(kNandPage));
+  loff_t block = 2 * kNandBlock;
+  ASSERT_EQ(Sys().ioctl(fd_, MEMSETBADBLOCK, &block), 0);
+  EXPECT_EQ(sim_.Bytes(kNode, 2 * kNandBlock, kNandPage), std::vector<uint8_t>(kNandPage, 0xFF));
+}
+
+TEST_F(KernelRulesTest, PartitionsOfAChipShareItsBytesAndBadBlocks) {
+  sim_.AddPartition(6, "NAND0.SYS.LOW", kNode, 0, 4 * kNandBlock);
+  sim_.AddPartition(7, "NAND0.SYS.HIGH", kNode, 4 * kNandBlock, 4 * kNandBlock);
+  int high = Sys().open("/dev/mtd7", O_RDWR, 0);
+  loff_t block = kNandBlock;
+  ASSERT_EQ(Sys().ioctl(high, MEMSETBADBLOCK, &block), 0);
+  loff_t inChip = 5 * kNandBlock;
+  EXPECT_EQ(Sys().ioctl(fd_, MEMGETBADBLOCK, &inChip), 1);
+  ASSERT_EQ(WriteAt(4 * kNandBlock, std::vector<uint8_t>(kNandPage, 0x5A)), static_cast<long>(kNandPage));
+  EXPECT_EQ(sim_.Bytes("/dev/mtd7", 0, 1), std::vector<uint8_t>{0x5A});
+  Sys().close(high);
+}
+
+TEST_F(KernelRulesTest, ReadOnlyPartitionsAndDescriptorModes) {
+  sim_.SetReadOnly(kNode);
+  errno = 0;
+  EXPECT_EQ(Sys().open(kNode, O_RDWR, 0), -1);
+  EXPECT_EQ(errno, EACCES);
+  EXPECT_EQ(Sys().fopen64(kNode, "r+b"), nullptr);
+  int reader = Sys().open(kNode, O_RDONLY, 0);
+  ASSERT_GE(reader, 0);
+  std::vector<uint8_t> page(kNandPage);
+  EXPECT_EQ(Sys().read(reader, page.data(), page.size()), static_cast<long>(kNandPage));
+  errno = 0;
+  EXPECT_EQ(Sys().write(reader, page.data(), page.size()), -1);
+  EXPECT_EQ(errno, EBADF);
+  erase_info_user region{0, static_cast<uint32_t>(kNandBlock)};
+  errno = 0;
+  EXPECT_EQ(Sys().ioctl(reader, MEMERASE, &region), -1);
+  EXPECT_EQ(errno, EPERM);
+  Sys().close(reader);
+}
+
 }  // namespace
 }  // namespace test
 }  // namespace stbplat

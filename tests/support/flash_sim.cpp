@@ -38,6 +38,26 @@ class MemoryStorage : public SimStorage {
   std::vector<uint8_t> bytes_;
 };
 
+// A partition: a window of its chip's bytes.
+class WindowStorage : public SimStorage {
+ public:
+  WindowStorage(std::shared_ptr<FlashSim::Node> chip, SimStorage& bytes, uint64_t offset, uint64_t size)
+      : chip_(std::move(chip)), bytes_(bytes), offset_(offset), size_(size) {}
+  uint64_t Size() const override { return size_; }
+  void Read(uint64_t offset, void* buffer, size_t length) const override {
+    bytes_.Read(offset_ + offset, buffer, length);
+  }
+  void Write(uint64_t offset, const void* data, size_t length) override {
+    bytes_.Write(offset_ + offset, data, length);
+  }
+  void Resize(uint64_t) override {}
+
+ private:
+  std::shared_ptr<FlashSim::Node> chip_;  // keeps the bytes alive
+  SimStorage& bytes_;
+  uint64_t offset_, size_;
+};
+
 FlashSim* g_current = nullptr;
 
 }  // namespace
@@ -51,7 +71,10 @@ struct FlashSim::Node {
   uint32_t eraseSize = 0;
   uint32_t writeSize = 1;
   std::unique_ptr<SimStorage> storage;
-  std::set<uint64_t> badBlocks;  // block start offsets
+  // Block start offsets in the chip; the partitions of a chip share it.
+  std::shared_ptr<std::set<uint64_t>> badBlocks = std::make_shared<std::set<uint64_t>>();
+  uint64_t chipOffset = 0;
+  bool readOnly = false;
   std::set<uint64_t> eccFailures;
   std::set<uint64_t> weakOffsets;
   uint32_t eccFailed = 0;
@@ -67,8 +90,9 @@ struct FlashSim::Node {
   }
   uint64_t PageOf(uint64_t offset) const { return offset - offset % writeSize; }
   uint32_t EccSteps() const { return std::max<uint32_t>(1, writeSize / kEccStep); }
+  bool IsBadBlock(uint64_t offset) const { return badBlocks->count(chipOffset + BlockOf(offset)) != 0; }
   void AddBad(uint64_t offset, bool countAgain) {
-    bool added = badBlocks.insert(BlockOf(offset)).second;
+    bool added = badBlocks->insert(chipOffset + BlockOf(offset)).second;
     if (added || countAgain) ++badBlockCount;
   }
 };
@@ -77,6 +101,7 @@ struct FlashSim::Handle {
   std::string path;  // empty for /dev/mem
   uint64_t position = 0;
   bool devMem = false;
+  bool writable = true;
 };
 
 struct FlashSim::Fault {
@@ -196,6 +221,12 @@ FILE* SimFopen(const char* path, const char* mode) {
     if (node == nullptr && !create) {
       delete cookie;
       errno = ENOENT;
+      return nullptr;
+    }
+    bool writing = create || std::strchr(mode, '+') != nullptr;
+    if (node != nullptr && node->readOnly && writing) {
+      delete cookie;
+      errno = EACCES;
       return nullptr;
     }
     if (node == nullptr) node = sim->Create(name, SimKind::kFile, 0);
@@ -327,6 +358,30 @@ void FlashSim::AddMtd(int number, const std::string& name, SimKind kind, uint64_
   procLines_[number] = line;
 }
 
+void FlashSim::AddPartition(int number, const std::string& name, const std::string& chipPath,
+                            uint64_t offset, uint64_t size) {
+  auto it = nodes_.find(chipPath);
+  if (it == nodes_.end()) return;
+  std::shared_ptr<Node> chip = it->second;
+  auto node = std::make_shared<Node>();
+  node->kind = chip->kind;
+  node->eraseSize = chip->eraseSize;
+  node->writeSize = chip->writeSize;
+  node->storage = std::make_unique<WindowStorage>(chip, *chip->storage, offset, size);
+  node->badBlocks = chip->badBlocks;
+  node->chipOffset = chip->chipOffset + offset;
+  nodes_["/dev/mtd" + std::to_string(number)] = node;
+  char line[200];
+  std::snprintf(line, sizeof line, "mtd%d: %08llx %08x \"%s\"\n", number, static_cast<unsigned long long>(size),
+                chip->eraseSize, name.c_str());
+  procLines_[number] = line;
+}
+
+void FlashSim::SetReadOnly(const std::string& path) {
+  Node* node = Find(path);
+  if (node != nullptr) node->readOnly = true;
+}
+
 void FlashSim::SetProcMtd(const std::string& text) {
   procOverride_ = text;
   hasOverride_ = true;
@@ -393,7 +448,7 @@ void FlashSim::MarkBad(const std::string& path, uint64_t offset) {
 
 bool FlashSim::IsBad(const std::string& path, uint64_t offset) const {
   const Node* node = Find(path);
-  return node != nullptr && node->badBlocks.count(node->BlockOf(offset)) != 0;
+  return node != nullptr && node->IsBadBlock(offset);
 }
 
 void FlashSim::AddEccFailure(const std::string& path, uint64_t offset) {
@@ -455,8 +510,14 @@ int FlashSim::Open(const char* path, int flags) {
       errno = ENOENT;
       return -1;
     }
+    // A read-only MTD partition refuses an open for writing, as the kernel's.
+    if (node != nullptr && node->readOnly && (flags & O_ACCMODE) != O_RDONLY) {
+      errno = EACCES;
+      return -1;
+    }
     if (node == nullptr) Create(name, SimKind::kFile, 0);
     handle->path = name;
+    handle->writable = (flags & O_ACCMODE) != O_RDONLY;
   }
   int fd = firstFd_;
   while (handles_.count(fd) != 0) ++fd;
@@ -594,6 +655,11 @@ ssize_t FlashSim::Read(int fd, void* buffer, size_t count) {
 }
 
 ssize_t FlashSim::Write(int fd, const void* data, size_t count) {
+  auto it = handles_.find(fd);
+  if (it != handles_.end() && !it->second->writable) {
+    errno = EBADF;
+    return -1;
+  }
   return DescriptorTransfer(SimCall::kWrite, fd, [&](Node& node, uint64_t position, size_t* done) {
     return NodeWrite(node, position, data, count, done);
   });
@@ -614,6 +680,11 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
     return -1;
   }
   uint64_t size = node->storage->Size();
+  // Requests that change the device need a descriptor open for writing.
+  if ((specific == SimCall::kMemErase || specific == SimCall::kMemSetBadBlock) && !it->second->writable) {
+    errno = EPERM;
+    return -1;
+  }
   switch (specific) {
     case SimCall::kMemGetInfo: {
       auto* info = static_cast<mtd_info_user*>(argument);
@@ -649,7 +720,7 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
       // Block by block: the blocks before a bad one are erased.
       std::vector<uint8_t> erased(node->eraseSize, kErased);
       for (uint64_t block = start; block < start + length; block += node->eraseSize) {
-        if (node->badBlocks.count(block) != 0) {
+        if (node->IsBadBlock(block)) {
           if (block > start) node->erases.emplace_back(start, block - start);
           errno = EIO;
           return -1;
@@ -666,7 +737,7 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
         return -1;
       }
       if (node->kind != SimKind::kNand) return 0;
-      return node->badBlocks.count(node->BlockOf(offset)) != 0 ? 1 : 0;
+      return node->IsBadBlock(offset) ? 1 : 0;
     }
     case SimCall::kMemSetBadBlock: {
       uint64_t offset = static_cast<uint64_t>(*static_cast<loff_t*>(argument));
@@ -678,6 +749,9 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
         errno = EINVAL;
         return -1;
       }
+      // The kernel erases the block before it writes the marker.
+      std::vector<uint8_t> erased(node->eraseSize, kErased);
+      node->storage->Write(node->BlockOf(offset), erased.data(), erased.size());
       node->AddBad(offset, true);
       return 0;
     }

@@ -12,7 +12,8 @@
 //   MTD_RAM with a write size of 1; real NOR clears bits, as here.
 // - NAND: writes start on a page and are whole pages (EINVAL otherwise);
 //   programming a written page clears bits (AND); a block marked bad still
-//   takes writes (only erases look at the bad-block table); a weak page
+//   takes writes (only erases look at the bad-block table); MEMSETBADBLOCK
+//   erases the block before it marks it; a weak page
 //   (FailWritesAt) fails the write with EIO after the pages before it and
 //   the weak page itself were programmed.
 // - Erase: a region of 0 bytes inside the device succeeds and does nothing;
@@ -78,6 +79,14 @@ class FlashSim {
   // /dev/mtdN and its /proc/mtd line ("mtdN: size erasesize \"name\"").
   void AddMtd(int number, const std::string& name, SimKind kind, uint64_t size,
               uint32_t eraseSize, uint32_t writeSize = 1);
+  // /dev/mtdN as a partition of the chip at chipPath: a window of its bytes
+  // at offset, sharing its bad-block table, as the kernel's partitions do.
+  void AddPartition(int number, const std::string& name, const std::string& chipPath, uint64_t offset,
+                    uint64_t size);
+  // A read-only partition: an open for writing fails with EACCES. Every
+  // descriptor keeps its access mode: a write through one opened read-only
+  // fails with EBADF, MEMERASE and MEMSETBADBLOCK with EPERM.
+  void SetReadOnly(const std::string& path);
   // Replaces the generated /proc/mtd text; "" with remove=true drops it.
   void SetProcMtd(const std::string& text);
   void RemoveProcMtd();

@@ -63,11 +63,13 @@ load() {  # load <module> [params...]
 
 # ---- Flash layout -------------------------------------------------------------
 # The box's table: NOR partitions first (mtd0-7), the whole NOR chip as mtd8,
-# then the NAND partitions. Each row: box number, kernel name, box name.
+# then the NAND partitions. Each row: box number, kernel name, box name, and
+# "ro" for a read-only partition (the boot loader's, as on the box): its node
+# is the kernel's read-only one, which refuses an open for writing (EACCES).
 NAND_PARTS=16,16,64,32
 NAND_ID=0x20,0xaa,0x00,0x15
 LAYOUT="
-0|flash0.BOOT.A|flash0.BOOT.A
+0|flash0.BOOT.A|flash0.BOOT.A|ro
 1|flash0.BOOT.B|flash0.BOOT.B
 2|flash0.CFG.A|flash0.CFG.A
 3|flash0.CFG.B|flash0.CFG.B
@@ -98,7 +100,7 @@ real_mtd() {  # real_mtd <kernel name> -> N of the kernel's mtdN
 make_table() {
   rm -f /dev/mtd[0-9]* /tmp/fake_mtd.new
   echo "dev:    size   erasesize  name" >/tmp/fake_mtd.new
-  echo "$LAYOUT" | while IFS='|' read -r box kname bname; do
+  echo "$LAYOUT" | while IFS='|' read -r box kname bname access; do
     [ -n "$box" ] || continue
     case "$kname" in
       block:*)
@@ -114,7 +116,9 @@ make_table() {
     size=$(cat /sys/class/mtd/mtd$r/size)
     erase=$(cat /sys/class/mtd/mtd$r/erasesize)
     dev=$(cat /sys/class/mtd/mtd$r/dev)
-    mknod /dev/mtd$box c "${dev%%:*}" "${dev##*:}"
+    minor=${dev##*:}
+    [ "$access" = ro ] && minor=$((minor + 1))  # mtdNro
+    mknod /dev/mtd$box c "${dev%%:*}" "$minor"
     printf 'mtd%d: %08x %08x "%s"\n' "$box" "$size" "$erase" "$bname" >>/tmp/fake_mtd.new
   done
   # Rewrite in place: /proc/mtd is bound to this very file.

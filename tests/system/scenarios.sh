@@ -119,7 +119,7 @@ run_flash() {
   if "$GUEST" --list | grep -qx "$1"; then run_guest "$1"; else info "skipped $1 (not in this build)"; fi
 }
 nand_load badblocks=$BAD_AT_LOAD
-for s in flash.table flash.nand_slot flash.nand_partial_page flash.mtd_utils flash.nor \
+for s in flash.table flash.nand_slot flash.nand_partial_page flash.mtd_utils flash.nor flash.nor_read_only \
          flash.emmc flash.erase_slots flash.timing streams.nand_record streams.sdram; do
   run_flash $s
 done

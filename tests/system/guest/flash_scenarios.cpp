@@ -5,15 +5,23 @@
 // round.
 #if __has_include("stbplat/flash_interface.h")
 
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <string>
 
 #include "harness.h"
 #include "mtd_device.h"
+#include "stbplat/component_location.h"
+#include "stbplat/extruder.h"
 #include "stbplat/flash_c.h"
 #include "stbplat/flash_interface.h"
+#include "stbplat/intruder.h"
 #include "stbplat/location.h"
+#include "stbplat/version_entry.h"
 
 namespace {
 
@@ -83,7 +91,7 @@ SCENARIO("flash.table") {
   CHECK_EQ(flash->GetNORSectorSize(), kNorSector);
   CHECK_EQ(GetNORSectorSize(), kNorSector);
   CHECK_EQ(flash->GetDevSize("/dev/mtd11"), 64 * kBlock);
-  CHECK_EQ(flash->GetDevSize("/dev/mtd0"), kNorPart);
+  CHECK_EQ(flash->GetDevSize("/dev/mtd1"), kNorPart);
   systest::ClearLog();
   CHECK_EQ(flash->GetDevSize("/dev/mtd29"), 0ul);
   CHECK_LOG("GetDevSize: Failed to obtain file handle for /dev/mtd29\r\n");
@@ -331,6 +339,40 @@ SCENARIO("flash.nor") {
   CHECK(WriteToNORFlashAtAddr(kNorBase + 0x3F0000, word.data(), word.size()));
   isRDLQUpgradeInProgress = false;
   CHECK_BYTES(chip.ReadAll(0x3F0000, 64), word);
+}
+
+SCENARIO("flash.nor_read_only") {
+  // BOOT.A (mtd0) is read-only, as the boot loader's partition is on the
+  // box: records and bytes read there; every write is refused by the kernel.
+  systest::MtdDevice chip("/dev/mtd8");
+  REQUIRE(chip.ok());
+  REQUIRE(chip.Erase(0, kNorPart) == 0);
+  VersionEntry version;
+  version.majorVersion = 3;
+  version.description.CreateData(6, reinterpret_cast<const unsigned char*>("boot.1"));
+  Intruder record(256u, 0u);
+  REQUIRE(version.StoreTLVAndData(&record) == 0);
+  std::vector<unsigned char> bytes(record.pStart, record.pStart + (record.pCurrent - record.pStart));
+  REQUIRE(chip.Write(0x100, bytes) == static_cast<long>(bytes.size()));
+  ComponentLocation component;
+  component.location = Loc("NOR0", "BOOT", "A");
+  component.slotOffset = 0x100;
+  Extruder in(&component, false);
+  CHECK(in.isInitedOK);
+  VersionEntry back;
+  CHECK_EQ(back.ReadTLVAndData(in, nullptr), 0u);
+  CHECK_EQ(back.majorVersion, 3);
+  CHECK(back.description == version.description);
+  std::vector<unsigned char> raw(bytes.size());
+  CHECK(ReadFromNORFlashAtAddr(kNorBase + 0x100, raw.data(), raw.size()));
+  CHECK_BYTES(raw, bytes);
+  int fd = open("/dev/mtd0", O_RDWR);
+  CHECK_EQ(fd < 0 ? errno : 0, EACCES);
+  if (fd >= 0) close(fd);
+  CHECK(!WriteToNORFlashAtAddr(kNorBase, raw.data(), raw.size()));
+  Intruder out(&component);
+  CHECK(!out.isInitedOK);
+  CHECK_BYTES(chip.ReadAll(0x100, bytes.size()), bytes);
 }
 
 SCENARIO("flash.emmc") {
