@@ -1,11 +1,12 @@
 #include "device_root.h"
 
+#include <dirent.h>
+
 #include <cctype>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
-#include <sstream>
 #include <vector>
 
 #include "util/ini_core.h"
@@ -14,7 +15,14 @@ namespace stbplat {
 namespace hostsim {
 namespace {
 
+using devmodel::Geometry;
+using devmodel::Medium;
+using devmodel::SimKind;
+
 constexpr int kMaxMtd = 30;
+constexpr int kMaxNameLength = 100;
+constexpr const char kIniSuffix[] = ".ini";
+constexpr size_t kIniSuffixLength = sizeof kIniSuffix - 1;
 constexpr uint64_t kDefaultNandPage = 2048;
 constexpr const char* kDevicePrefixes[] = {"/dev/", "/proc/", "/sys/"};
 
@@ -97,24 +105,14 @@ bool ApplySettings(const Settings& settings, Geometry* g, const std::string& whe
 
 }  // namespace
 
-int MtdNumberOfPath(const char* path) {
-  static const char kPrefix[] = "/dev/mtd";
-  if (path == nullptr || std::strncmp(path, kPrefix, sizeof kPrefix - 1) != 0) return -1;
-  const char* digits = path + sizeof kPrefix - 1;
-  if (!std::isdigit(static_cast<unsigned char>(*digits))) return -1;
-  char* end = nullptr;
-  long number = std::strtol(digits, &end, 10);
-  if (*end != '\0' || number >= kMaxMtd) return -1;
-  return static_cast<int>(number);
-}
-
-std::unique_ptr<DeviceRoot> DeviceRoot::Load(const std::string& root, std::string* error) {
-  std::unique_ptr<DeviceRoot> device(new DeviceRoot(root));
+bool DeviceRoot::Load(const std::string& root, devmodel::FlashSim& sim, std::string* error) {
+  DeviceRoot loader(root, sim);
+  DeviceRoot* device = &loader;
   std::string tablePath = root + "/proc/mtd";
   std::ifstream table(tablePath);
   if (!table) {
     *error = tablePath + ": cannot be read";
-    return nullptr;
+    return false;
   }
   struct Row {
     int number;
@@ -128,25 +126,26 @@ std::unique_ptr<DeviceRoot> DeviceRoot::Load(const std::string& root, std::strin
     if (line.empty()) continue;
     int number = -1;
     unsigned long long size = 0, erase = 0;
-    char name[101] = {0};
+    char name[kMaxNameLength + 1] = {0};
     if (std::sscanf(line.c_str(), "mtd%d: %llx %llx \"%100[^\"]\"", &number, &size, &erase, name) != 4 ||
         number < 0 || number >= kMaxMtd) {
       *error = tablePath + ": cannot read line '" + line + "'";
-      return nullptr;
+      return false;
     }
     rows.push_back({number, size, erase, name});
     device->mtdSizes_["mtd" + std::to_string(number)] = {size, erase};
     device->mtdNames_["mtd" + std::to_string(number)] = name;
   }
   for (const Row& row : rows)
-    if (!device->LoadNode(row.number, row.size, row.eraseSize, row.name, error)) return nullptr;
-  return device;
+    if (!device->LoadNode(row.number, row.size, row.eraseSize, row.name, error)) return false;
+  if (!device->LoadEmmcDevices(error)) return false;
+  return true;
 }
 
-FlashImage* DeviceRoot::Image(const std::string& name, std::string* error) {
-  auto found = images_.find(name);
-  if (found != images_.end()) return found->second.get();
-  std::string path = root_ + "/dev/" + name;
+devmodel::DeviceNode* DeviceRoot::Image(const std::string& name, std::string* error) {
+  std::string devicePath = "/dev/" + name;
+  if (images_.count(name) != 0) return sim_.Find(devicePath);
+  std::string path = root_ + devicePath;
   Settings settings;
   if (!ReadSettings(path + ".ini", &settings, error)) return nullptr;
   Geometry g;
@@ -159,11 +158,16 @@ FlashImage* DeviceRoot::Image(const std::string& name, std::string* error) {
     g.medium = Medium::kEmmc;
   }
   if (!ApplySettings(settings, &g, path + ".ini", error)) return nullptr;
-  std::unique_ptr<FlashImage> image = FlashImage::Open(path, g, error);
-  if (!image) return nullptr;
-  FlashImage* raw = image.get();
-  images_[name] = std::move(image);
-  return raw;
+  std::unique_ptr<devmodel::SimStorage> storage = devmodel::OpenImageStorage(path, g, error);
+  if (!storage) return nullptr;
+  images_[name] = g;
+  // An eMMC image under an MTD node is an MTD over a block device.
+  SimKind kind = g.medium == Medium::kNand  ? SimKind::kNand
+                 : g.medium == Medium::kNor ? SimKind::kNor
+                 : mtd != mtdSizes_.end()   ? SimKind::kRam
+                                            : SimKind::kEmmc;
+  return sim_.AddNode(devicePath, kind, std::move(storage), static_cast<uint32_t>(g.eraseSize),
+                      static_cast<uint32_t>(g.writeSize), static_cast<uint32_t>(g.oobSize));
 }
 
 bool DeviceRoot::LoadNode(int number, uint64_t size, uint64_t eraseSize, const std::string& name,
@@ -173,34 +177,55 @@ bool DeviceRoot::LoadNode(int number, uint64_t size, uint64_t eraseSize, const s
   Settings settings;
   if (!ReadSettings(settingsPath, &settings, error)) return false;
   std::string imageName = settings.count("image") ? settings["image"] : self;
-  MtdNode node;
-  node.image = Image(imageName, error);
-  if (node.image == nullptr) return false;
-  if (!Number(settings, "offset", &node.base, settingsPath, error)) return false;
-  node.geometry = node.image->geometry();
-  node.geometry.size = size;
-  if (eraseSize != 0 && eraseSize != node.geometry.eraseSize && node.geometry.medium != Medium::kEmmc) {
+  devmodel::DeviceNode* image = Image(imageName, error);
+  if (image == nullptr) return false;
+  uint64_t base = 0;
+  if (!Number(settings, "offset", &base, settingsPath, error)) return false;
+  const Geometry& g = images_[imageName];
+  if (eraseSize != 0 && eraseSize != g.eraseSize && g.medium != Medium::kEmmc) {
     *error = root_ + "/proc/mtd: " + self + " (" + name + ") erase size differs from its image's";
     return false;
   }
-  if (node.base > node.image->geometry().size || size > node.image->geometry().size - node.base ||
-      (node.geometry.eraseSize != 0 && node.base % node.geometry.eraseSize != 0)) {
+  if (base > g.size || size > g.size - base || (g.eraseSize != 0 && base % g.eraseSize != 0)) {
     *error = settingsPath + ": offset and size do not fit image " + imageName;
     return false;
   }
-  nodes_[number] = node;
+  if (imageName == self) {
+    sim_.ListInProcMtd(number, name, size, static_cast<uint32_t>(eraseSize));
+    return true;
+  }
+  devmodel::DeviceNode* node = sim_.AddPartition(number, name, "/dev/" + imageName, base, size);
+  if (node != nullptr && node->kind == SimKind::kEmmc) node->kind = SimKind::kRam;
   return true;
 }
 
-MtdNode* DeviceRoot::Node(int number) {
-  auto it = nodes_.find(number);
-  return it == nodes_.end() ? nullptr : &it->second;
+// Every dev/NAME.ini of medium emmc that no MTD partition is: a whole eMMC
+// device, reached through its block node /dev/NAME.
+bool DeviceRoot::LoadEmmcDevices(std::string* error) {
+  DIR* dir = opendir((root_ + "/dev").c_str());
+  if (dir == nullptr) return true;
+  std::vector<std::string> names;
+  while (const dirent* entry = readdir(dir)) {
+    std::string file = entry->d_name;
+    size_t stem = file.size() - kIniSuffixLength;
+    if (file.size() > kIniSuffixLength && file.compare(stem, kIniSuffixLength, kIniSuffix) == 0)
+      names.push_back(file.substr(0, stem));
+  }
+  closedir(dir);
+  for (const std::string& name : names) {
+    if (mtdSizes_.count(name) != 0 || images_.count(name) != 0) continue;
+    Settings settings;
+    if (!ReadSettings(root_ + "/dev/" + name + ".ini", &settings, error)) return false;
+    auto medium = settings.find("medium");
+    if (medium != settings.end() && medium->second == "emmc" && Image(name, error) == nullptr) return false;
+  }
+  return true;
 }
 
-std::string DeviceRoot::HostPath(const char* path) const {
+std::string HostPath(const std::string& root, const char* path) {
   if (path == nullptr) return "";
   for (const char* prefix : kDevicePrefixes)
-    if (std::strncmp(path, prefix, std::strlen(prefix)) == 0) return root_ + path;
+    if (std::strncmp(path, prefix, std::strlen(prefix)) == 0) return root + path;
   return path;
 }
 

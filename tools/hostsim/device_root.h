@@ -1,5 +1,6 @@
 // The files of an emulated device (see host_mode.h for the layout), loaded
-// once: the MTD partitions listed in proc/mtd and the images behind them.
+// once into the emulated device: the MTD partitions listed in proc/mtd, the
+// images behind them and the eMMC devices.
 #ifndef STBPLAT_HOSTSIM_DEVICE_ROOT_H
 #define STBPLAT_HOSTSIM_DEVICE_ROOT_H
 
@@ -8,48 +9,37 @@
 #include <memory>
 #include <string>
 
-#include "flash_image.h"
+#include "devmodel/flash_sim.h"
+#include "devmodel/image_storage.h"
 
 namespace stbplat {
 namespace hostsim {
 
-// /dev/mtdN: a window of an image. Several partitions may share one image
-// (a whole-chip partition and the slots inside it).
-struct MtdNode {
-  FlashImage* image = nullptr;
-  uint64_t base = 0;  // where the partition starts in the image
-  Geometry geometry;  // the partition's own size, the image's block sizes
-};
-
 class DeviceRoot {
  public:
-  // Reads proc/mtd and opens every partition's image. On failure returns
-  // null and says which file is wrong.
-  static std::unique_ptr<DeviceRoot> Load(const std::string& root, std::string* error);
-
-  const std::string& root() const { return root_; }
-  // Null when the partition does not exist.
-  MtdNode* Node(int number);
-  // Where a device path lies on the host: under the root for /dev, /proc and
-  // /sys, unchanged otherwise.
-  std::string HostPath(const char* path) const;
+  // Reads proc/mtd and the settings beside the images, and adds every
+  // partition and eMMC device to sim. On failure returns false and says
+  // which file is wrong.
+  static bool Load(const std::string& root, devmodel::FlashSim& sim, std::string* error);
 
  private:
-  explicit DeviceRoot(const std::string& root) : root_(root) {}
-  FlashImage* Image(const std::string& name, std::string* error);
-  bool LoadNode(int number, uint64_t size, uint64_t eraseSize, const std::string& name,
-                std::string* error);
+  DeviceRoot(const std::string& root, devmodel::FlashSim& sim) : root_(root), sim_(sim) {}
+  // The node of image `name` (dev/NAME), added on first use.
+  devmodel::DeviceNode* Image(const std::string& name, std::string* error);
+  bool LoadNode(int number, uint64_t size, uint64_t eraseSize, const std::string& name, std::string* error);
+  bool LoadEmmcDevices(std::string* error);
 
   std::string root_;
-  std::map<int, MtdNode> nodes_;
-  std::map<std::string, std::unique_ptr<FlashImage>> images_;
-  // proc/mtd sizes, for partitions used as images of others.
+  devmodel::FlashSim& sim_;
+  std::map<std::string, devmodel::Geometry> images_;
+  // proc/mtd sizes and names, for partitions used as images of others.
   std::map<std::string, std::pair<uint64_t, uint64_t>> mtdSizes_;
   std::map<std::string, std::string> mtdNames_;
 };
 
-// "/dev/mtd7" gives 7; anything else (including "/dev/mtd7ro") gives -1.
-int MtdNumberOfPath(const char* path);
+// Where a device path lies on the host: under root for /dev, /proc and /sys,
+// unchanged otherwise.
+std::string HostPath(const std::string& root, const char* path);
 
 }  // namespace hostsim
 }  // namespace stbplat

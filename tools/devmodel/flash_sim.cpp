@@ -1,7 +1,8 @@
-#include "support/flash_sim.h"
+#include "flash_sim.h"
 
 #include <fcntl.h>
 #include <mtd/mtd-user.h>
+#include <unistd.h>
 #include <sys/ioctl.h>
 #include <sys/mman.h>
 
@@ -11,91 +12,21 @@
 #include <cstring>
 
 namespace stbplat {
-namespace test {
+namespace devmodel {
 
 namespace {
 
-constexpr uint8_t kErased = 0xFF;
-// The NAND driver checks ECC in steps of this many bytes; an unreadable
-// page counts one failure per step.
-constexpr uint32_t kEccStep = 256;
 constexpr const char* kProcMtdPath = "/proc/mtd";
 constexpr const char* kDevMemPath = "/dev/mem";
-
-class MemoryStorage : public SimStorage {
- public:
-  MemoryStorage(uint64_t size, uint8_t fill) : bytes_(size, fill) {}
-  uint64_t Size() const override { return bytes_.size(); }
-  void Read(uint64_t offset, void* buffer, size_t length) const override {
-    if (length != 0) std::memcpy(buffer, bytes_.data() + offset, length);
-  }
-  void Write(uint64_t offset, const void* data, size_t length) override {
-    if (length != 0) std::memcpy(bytes_.data() + offset, data, length);
-  }
-  void Resize(uint64_t size) override { bytes_.resize(size, 0); }
-
- private:
-  std::vector<uint8_t> bytes_;
-};
-
-// A partition: a window of its chip's bytes.
-class WindowStorage : public SimStorage {
- public:
-  WindowStorage(std::shared_ptr<FlashSim::Node> chip, SimStorage& bytes, uint64_t offset, uint64_t size)
-      : chip_(std::move(chip)), bytes_(bytes), offset_(offset), size_(size) {}
-  uint64_t Size() const override { return size_; }
-  void Read(uint64_t offset, void* buffer, size_t length) const override {
-    bytes_.Read(offset_ + offset, buffer, length);
-  }
-  void Write(uint64_t offset, const void* data, size_t length) override {
-    bytes_.Write(offset_ + offset, data, length);
-  }
-  void Resize(uint64_t) override {}
-
- private:
-  std::shared_ptr<FlashSim::Node> chip_;  // keeps the bytes alive
-  SimStorage& bytes_;
-  uint64_t offset_, size_;
-};
+constexpr size_t kProcLineMax = 200;
+// What nandsim reports for a 2 KiB page.
+constexpr uint32_t kNandOobSize = 64;
 
 FlashSim* g_current = nullptr;
 
+const os::SysCalls& Libc() { return os::LibcSysCalls(); }
+
 }  // namespace
-
-std::unique_ptr<SimStorage> MakeMemoryStorage(uint64_t size, uint8_t fill) {
-  return std::make_unique<MemoryStorage>(size, fill);
-}
-
-struct FlashSim::Node {
-  SimKind kind;
-  uint32_t eraseSize = 0;
-  uint32_t writeSize = 1;
-  std::unique_ptr<SimStorage> storage;
-  // Block start offsets in the chip; the partitions of a chip share it.
-  std::shared_ptr<std::set<uint64_t>> badBlocks = std::make_shared<std::set<uint64_t>>();
-  uint64_t chipOffset = 0;
-  bool readOnly = false;
-  std::set<uint64_t> eccFailures;
-  std::set<uint64_t> weakOffsets;
-  uint32_t eccFailed = 0;
-  // What ECCGETSTATS reports: the partition counts every successful
-  // MEMSETBADBLOCK, a block marked twice included.
-  uint32_t badBlockCount = 0;
-  uint32_t garbageReads = 0;
-  std::vector<std::pair<uint64_t, uint64_t>> writes;
-  std::vector<std::pair<uint64_t, uint64_t>> erases;
-  bool isMtd() const { return kind == SimKind::kNor || kind == SimKind::kNand; }
-  uint64_t BlockOf(uint64_t offset) const {
-    return eraseSize == 0 ? offset : offset - offset % eraseSize;
-  }
-  uint64_t PageOf(uint64_t offset) const { return offset - offset % writeSize; }
-  uint32_t EccSteps() const { return std::max<uint32_t>(1, writeSize / kEccStep); }
-  bool IsBadBlock(uint64_t offset) const { return badBlocks->count(chipOffset + BlockOf(offset)) != 0; }
-  void AddBad(uint64_t offset, bool countAgain) {
-    bool added = badBlocks->insert(chipOffset + BlockOf(offset)).second;
-    if (added || countAgain) ++badBlockCount;
-  }
-};
 
 struct FlashSim::Handle {
   std::string path;  // empty for /dev/mem
@@ -115,7 +46,9 @@ struct FlashSim::Fault {
 namespace {
 
 // The seam table: every entry forwards to the bound simulator.
-int SimOpen(const char* path, int flags, mode_t) { return FlashSim::Current()->Open(path, flags); }
+int SimOpen(const char* path, int flags, mode_t mode) {
+  return FlashSim::Current()->Open(path, flags, mode);
+}
 int SimClose(int fd) { return FlashSim::Current()->Close(fd); }
 off64_t SimLseek(int fd, off64_t offset, int whence) {
   return FlashSim::Current()->Seek(fd, offset, whence);
@@ -151,7 +84,7 @@ ssize_t CookieRead(void* raw, char* buffer, size_t size) {
   FlashSim::Node* node = cookie->sim->Find(cookie->path);
   if (node == nullptr) return -1;
   size_t done = 0;
-  int error = cookie->sim->NodeRead(*node, cookie->position, buffer, size, &done);
+  int error = node->Read(cookie->position, buffer, size, &done);
   if (error != 0) {
     errno = error;
     return -1;
@@ -165,7 +98,7 @@ ssize_t CookieWrite(void* raw, const char* data, size_t size) {
   FlashSim::Node* node = cookie->isText ? nullptr : cookie->sim->Find(cookie->path);
   if (node == nullptr) return 0;
   size_t done = 0;
-  int error = cookie->sim->NodeWrite(*node, cookie->position, data, size, &done);
+  int error = node->Write(cookie->position, data, size, &done);
   if (error != 0) {
     errno = error;
     return 0;
@@ -179,7 +112,7 @@ int CookieSeek(void* raw, off64_t* offset, int whence) {
   uint64_t end = cookie->text.size();
   if (!cookie->isText) {
     FlashSim::Node* node = cookie->sim->Find(cookie->path);
-    end = node == nullptr ? 0 : node->storage->Size();
+    end = node == nullptr ? 0 : node->Size();
   }
   int64_t base = whence == SEEK_SET ? 0
                  : whence == SEEK_CUR ? static_cast<int64_t>(cookie->position)
@@ -218,6 +151,10 @@ FILE* SimFopen(const char* path, const char* mode) {
     cookie->text = text;
   } else {
     FlashSim::Node* node = sim->Find(name);
+    if (node == nullptr && sim->PassesThrough()) {
+      delete cookie;
+      return Libc().fopen64(sim->HostPath(path).c_str(), mode);
+    }
     if (node == nullptr && !create) {
       delete cookie;
       errno = ENOENT;
@@ -266,22 +203,30 @@ char* SimFgets(char* buffer, int size, FILE* file) {
   return std::fgets(buffer, size, file);
 }
 int SimFerror(FILE* file) { return std::ferror(file); }
+// The emulated device runs no shell tools.
 FILE* SimPopen(const char*, const char*) {
   errno = ENOENT;
   return nullptr;
 }
 int SimPclose(FILE*) { return -1; }
-void* SimMmap(void*, size_t length, int, int, int fd, off64_t offset) {
-  return FlashSim::Current()->Map(length, fd, offset);
+void* SimMmap(void*, size_t length, int protection, int flags, int fd, off64_t offset) {
+  return FlashSim::Current()->Map(length, protection, flags, fd, offset);
 }
-int SimMunmap(void*, size_t) { return 0; }
+int SimMunmap(void* address, size_t length) {
+  FlashSim* sim = FlashSim::Current();
+  return sim->PassesThrough() && !sim->IsEmulatedMemory(address) ? Libc().munmap(address, length) : 0;
+}
 int SimPageSize();
-ssize_t SimReadlink(const char*, char*, size_t) {
+ssize_t SimReadlink(const char* path, char* buffer, size_t size) {
+  FlashSim* sim = FlashSim::Current();
+  if (sim->PassesThrough()) return Libc().readlink(sim->HostPath(path).c_str(), buffer, size);
   errno = ENOENT;
   return -1;
 }
 int SimUnlink(const char* path) { return FlashSim::Current()->Unlink(path); }
-unsigned int SimSleep(unsigned int) { return 0; }
+unsigned int SimSleep(unsigned int seconds) {
+  return FlashSim::Current()->PassesThrough() ? Libc().sleep(seconds) : 0;
+}
 
 }  // namespace
 
@@ -298,11 +243,16 @@ FlashSim::FlashSim() : previous_(g_current) {
 
 FlashSim::~FlashSim() {
   binding_.reset();
+  if (PassesThrough())
+    for (const auto& handle : handles_) Libc().close(handle.first);
   g_current = previous_;
 }
 
 namespace {
-int SimPageSize() { return FlashSim::Current()->PageSize(); }
+int SimPageSize() {
+  FlashSim* sim = FlashSim::Current();
+  return sim->PassesThrough() ? Libc().getpagesize() : sim->PageSize();
+}
 }  // namespace
 
 
@@ -341,40 +291,65 @@ const FlashSim::Node* FlashSim::Find(const std::string& path) const {
 FlashSim::Node* FlashSim::Create(const std::string& path, SimKind kind, uint64_t size) {
   auto node = std::make_shared<Node>();
   node->kind = kind;
-  node->storage = MakeMemoryStorage(size, kind == SimKind::kFile ? 0 : kErased);
+  node->storage = MakeMemoryStorage(size, kind == SimKind::kFile ? 0 : kErasedByte);
+  node->recordHistory = !PassesThrough();
   Node* raw = node.get();
   nodes_[path] = std::move(node);
   return raw;
 }
+
+DeviceNode* FlashSim::AddNode(const std::string& path, SimKind kind, std::unique_ptr<SimStorage> storage,
+                              uint32_t eraseSize, uint32_t writeSize, uint32_t oobSize) {
+  Node* node = Create(path, kind, 0);
+  node->storage = std::move(storage);
+  node->eraseSize = eraseSize;
+  node->writeSize = writeSize;
+  node->oobSize = oobSize;
+  node->LoadBadBlocks();
+  return node;
+}
+
+void FlashSim::ListInProcMtd(int number, const std::string& name, uint64_t size, uint32_t eraseSize) {
+  char line[kProcLineMax];
+  std::snprintf(line, sizeof line, "mtd%d: %08llx %08x \"%s\"\n", number, static_cast<unsigned long long>(size),
+                eraseSize, name.c_str());
+  procLines_[number] = line;
+}
+
+void FlashSim::PassThrough(std::function<std::string(const char*)> hostPath) {
+  hostPath_ = std::move(hostPath);
+}
+
+std::string FlashSim::HostPath(const char* path) const { return hostPath_(path); }
 
 void FlashSim::AddMtd(int number, const std::string& name, SimKind kind, uint64_t size,
                       uint32_t eraseSize, uint32_t writeSize) {
   Node* node = Create("/dev/mtd" + std::to_string(number), kind, size);
   node->eraseSize = eraseSize;
   node->writeSize = writeSize;
-  char line[200];
-  std::snprintf(line, sizeof line, "mtd%d: %08llx %08x \"%s\"\n", number,
-                static_cast<unsigned long long>(size), eraseSize, name.c_str());
-  procLines_[number] = line;
+  node->oobSize = kind == SimKind::kNand ? kNandOobSize : 0;
+  ListInProcMtd(number, name, size, eraseSize);
 }
 
-void FlashSim::AddPartition(int number, const std::string& name, const std::string& chipPath,
-                            uint64_t offset, uint64_t size) {
+DeviceNode* FlashSim::AddPartition(int number, const std::string& name, const std::string& chipPath,
+                                   uint64_t offset, uint64_t size) {
   auto it = nodes_.find(chipPath);
-  if (it == nodes_.end()) return;
+  if (it == nodes_.end()) return nullptr;
   std::shared_ptr<Node> chip = it->second;
   auto node = std::make_shared<Node>();
   node->kind = chip->kind;
   node->eraseSize = chip->eraseSize;
   node->writeSize = chip->writeSize;
-  node->storage = std::make_unique<WindowStorage>(chip, *chip->storage, offset, size);
+  node->oobSize = chip->oobSize;
+  node->recordHistory = chip->recordHistory;
+  node->storage = MakeWindowStorage(*chip->storage, offset, size);
+  node->chip = chip;
   node->badBlocks = chip->badBlocks;
   node->chipOffset = chip->chipOffset + offset;
+  node->LoadBadBlocks();
   nodes_["/dev/mtd" + std::to_string(number)] = node;
-  char line[200];
-  std::snprintf(line, sizeof line, "mtd%d: %08llx %08x \"%s\"\n", number, static_cast<unsigned long long>(size),
-                chip->eraseSize, name.c_str());
-  procLines_[number] = line;
+  ListInProcMtd(number, name, size, chip->eraseSize);
+  return node.get();
 }
 
 void FlashSim::SetReadOnly(const std::string& path) {
@@ -416,6 +391,14 @@ bool FlashSim::HasFile(const std::string& path) const { return Find(path) != nul
 
 void FlashSim::AddMemory(uint64_t physBase, uint64_t size) {
   memory_.push_back(Region{physBase, std::vector<uint8_t>(size, 0)});
+}
+
+bool FlashSim::IsEmulatedMemory(const void* address) const {
+  for (const Region& region : memory_) {
+    const uint8_t* at = static_cast<const uint8_t*>(address);
+    if (at >= region.bytes.data() && at < region.bytes.data() + region.bytes.size()) return true;
+  }
+  return false;
 }
 
 uint8_t* FlashSim::Memory(uint64_t physAddress) {
@@ -498,14 +481,16 @@ void FlashSim::ClearHistory() {
 
 int FlashSim::OpenCount() const { return static_cast<int>(handles_.size()) + openFiles_; }
 
-int FlashSim::Open(const char* path, int flags) {
+int FlashSim::Open(const char* path, int flags, mode_t mode) {
   if (Hit(SimCall::kOpen)) return -1;
   std::string name(path);
+  Node* node = Find(name);
+  bool devMem = name == kDevMemPath && !(PassesThrough() && memory_.empty());
+  if (node == nullptr && !devMem && PassesThrough()) return Libc().open(HostPath(path).c_str(), flags, mode);
   auto handle = std::make_unique<Handle>();
-  if (name == kDevMemPath) {
+  if (devMem) {
     handle->devMem = true;
   } else {
-    Node* node = Find(name);
     if (node == nullptr && (flags & O_CREAT) == 0) {
       errno = ENOENT;
       return -1;
@@ -520,6 +505,10 @@ int FlashSim::Open(const char* path, int flags) {
     handle->writable = (flags & O_ACCMODE) != O_RDONLY;
   }
   int fd = firstFd_;
+  if (PassesThrough()) {
+    fd = Libc().open("/dev/null", O_RDONLY | O_CLOEXEC, 0);
+    if (fd < 0) return fd;
+  }
   while (handles_.count(fd) != 0) ++fd;
   handles_[fd] = std::move(handle);
   return fd;
@@ -527,6 +516,10 @@ int FlashSim::Open(const char* path, int flags) {
 
 int FlashSim::Close(int fd) {
   bool failed = Hit(SimCall::kClose);
+  if (PassesThrough()) {
+    handles_.erase(fd);
+    return Libc().close(fd);
+  }
   if (handles_.erase(fd) == 0) {
     errno = EBADF;
     return -1;
@@ -538,18 +531,19 @@ int FlashSim::Close(int fd) {
 off64_t FlashSim::Seek(int fd, off64_t offset, int whence) {
   if (Hit(SimCall::kLseek)) return -1;
   auto it = handles_.find(fd);
+  if (it == handles_.end() && PassesThrough()) return Libc().lseek64(fd, offset, whence);
   if (it == handles_.end()) {
     errno = EBADF;
     return -1;
   }
   Node* node = Find(it->second->path);
-  uint64_t size = node == nullptr ? 0 : node->storage->Size();
+  uint64_t size = node == nullptr ? 0 : node->Size();
   int64_t base = whence == SEEK_SET ? 0
                  : whence == SEEK_CUR ? static_cast<int64_t>(it->second->position)
                                       : static_cast<int64_t>(size);
   int64_t target = base + offset;
   // The MTD character device refuses positions past its end.
-  if (target < 0 || (node != nullptr && node->isMtd() && static_cast<uint64_t>(target) > size)) {
+  if (target < 0 || (node != nullptr && node->IsMtd() && static_cast<uint64_t>(target) > size)) {
     errno = EINVAL;
     return -1;
   }
@@ -557,82 +551,11 @@ off64_t FlashSim::Seek(int fd, off64_t offset, int whence) {
   return target;
 }
 
-int FlashSim::NodeRead(Node& node, uint64_t offset, void* buffer, size_t count, size_t* done) {
-  uint64_t size = node.storage->Size();
-  *done = 0;
-  if (offset >= size) return 0;
-  size_t n = static_cast<size_t>(std::min<uint64_t>(count, size - offset));
-  node.storage->Read(offset, buffer, n);
-  // The driver reads whole pages: a failing page counts once per ECC step
-  // however little of it was asked for, and its bytes come back scrambled.
-  std::set<uint64_t> failedPages;
-  for (uint64_t failure : node.eccFailures)
-    if (node.PageOf(failure) < offset + n && node.PageOf(failure) + node.writeSize > offset)
-      failedPages.insert(node.PageOf(failure));
-  auto* bytes = static_cast<uint8_t*>(buffer);
-  for (uint64_t page : failedPages) {
-    node.eccFailed += node.EccSteps();
-    uint32_t state = static_cast<uint32_t>(page) ^ (++node.garbageReads * 0x9E3779B9u);
-    uint64_t from = std::max(page, offset);
-    uint64_t to = std::min<uint64_t>(page + node.writeSize, offset + n);
-    for (uint64_t at = from; at < to; ++at) {
-      state = state * 1103515245u + 12345u;
-      // Never 0, so every byte differs from what was programmed.
-      bytes[at - offset] ^= static_cast<uint8_t>(1 + (state >> 16) % 255);
-    }
-  }
-  *done = n;
-  return 0;
-}
-
-int FlashSim::NodeWrite(Node& node, uint64_t offset, const void* data, size_t count,
-                        size_t* done) {
-  *done = 0;
-  uint64_t size = node.storage->Size();
-  if (node.kind == SimKind::kFile) {
-    if (offset + count > size) node.storage->Resize(offset + count);
-    node.storage->Write(offset, data, count);
-    node.writes.emplace_back(offset, count);
-    *done = count;
-    return 0;
-  }
-  // A device takes what fits before its end; only a write starting there
-  // fails.
-  if (offset >= size) return ENOSPC;
-  count = static_cast<size_t>(std::min<uint64_t>(count, size - offset));
-  if (node.kind == SimKind::kNand &&
-      (offset % node.writeSize != 0 || count % node.writeSize != 0))
-    return EINVAL;
-  // A weak page fails the write after the pages before it and the page
-  // itself were programmed.
-  size_t programmed = count;
-  bool weakPage = false;
-  for (uint64_t weak : node.weakOffsets) {
-    if (weak < offset || weak >= offset + count) continue;
-    weakPage = true;
-    programmed = std::min<size_t>(programmed, node.PageOf(weak) + node.writeSize - offset);
-  }
-  const auto* bytes = static_cast<const uint8_t*>(data);
-  if (node.isMtd()) {
-    // Flash cells only go from 1 to 0; the MTD layer does not consult the
-    // bad-block table on writes.
-    std::vector<uint8_t> cells(programmed);
-    node.storage->Read(offset, cells.data(), programmed);
-    for (size_t i = 0; i < programmed; ++i) cells[i] &= bytes[i];
-    node.storage->Write(offset, cells.data(), programmed);
-  } else {
-    node.storage->Write(offset, data, programmed);
-  }
-  node.writes.emplace_back(offset, programmed);
-  if (weakPage) return EIO;
-  *done = count;
-  return 0;
-}
-
-template <typename Transfer>
-ssize_t FlashSim::DescriptorTransfer(SimCall call, int fd, Transfer transfer) {
+template <typename Transfer, typename PassThroughCall>
+ssize_t FlashSim::DescriptorTransfer(SimCall call, int fd, Transfer transfer, PassThroughCall passThrough) {
   if (Hit(call)) return -1;
   auto it = handles_.find(fd);
+  if (it == handles_.end() && PassesThrough()) return passThrough();
   Node* node = it == handles_.end() ? nullptr : Find(it->second->path);
   if (node == nullptr) {
     errno = EBADF;
@@ -649,9 +572,10 @@ ssize_t FlashSim::DescriptorTransfer(SimCall call, int fd, Transfer transfer) {
 }
 
 ssize_t FlashSim::Read(int fd, void* buffer, size_t count) {
-  return DescriptorTransfer(SimCall::kRead, fd, [&](Node& node, uint64_t position, size_t* done) {
-    return NodeRead(node, position, buffer, count, done);
-  });
+  return DescriptorTransfer(
+      SimCall::kRead, fd,
+      [&](Node& node, uint64_t position, size_t* done) { return node.Read(position, buffer, count, done); },
+      [&] { return Libc().read(fd, buffer, count); });
 }
 
 ssize_t FlashSim::Write(int fd, const void* data, size_t count) {
@@ -660,9 +584,10 @@ ssize_t FlashSim::Write(int fd, const void* data, size_t count) {
     errno = EBADF;
     return -1;
   }
-  return DescriptorTransfer(SimCall::kWrite, fd, [&](Node& node, uint64_t position, size_t* done) {
-    return NodeWrite(node, position, data, count, done);
-  });
+  return DescriptorTransfer(
+      SimCall::kWrite, fd,
+      [&](Node& node, uint64_t position, size_t* done) { return node.Write(position, data, count, done); },
+      [&] { return Libc().write(fd, data, count); });
 }
 
 int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
@@ -674,96 +599,52 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
                                                   : SimCall::kAny;
   if (Hit(SimCall::kIoctl, specific)) return -1;
   auto it = handles_.find(fd);
+  if (it == handles_.end() && PassesThrough()) return Libc().ioctl(fd, request, argument);
   Node* node = it == handles_.end() ? nullptr : Find(it->second->path);
-  if (node == nullptr || !node->isMtd()) {
+  if (node == nullptr || !node->IsMtd()) {
     errno = node == nullptr ? EBADF : ENOTTY;
     return -1;
   }
-  uint64_t size = node->storage->Size();
   // Requests that change the device need a descriptor open for writing.
   if ((specific == SimCall::kMemErase || specific == SimCall::kMemSetBadBlock) && !it->second->writable) {
     errno = EPERM;
     return -1;
   }
+  int error = 0;
   switch (specific) {
-    case SimCall::kMemGetInfo: {
-      auto* info = static_cast<mtd_info_user*>(argument);
-      *info = mtd_info_user{};
-      info->type = node->kind == SimKind::kNand ? MTD_NANDFLASH : MTD_NORFLASH;
-      info->flags = node->kind == SimKind::kNand ? MTD_CAP_NANDFLASH : MTD_CAP_NORFLASH;
-      info->size = static_cast<__u32>(size);
-      info->erasesize = node->eraseSize;
-      info->writesize = node->writeSize;
-      info->oobsize = node->kind == SimKind::kNand ? 64 : 0;
+    case SimCall::kMemGetInfo:
+      *static_cast<mtd_info_user*>(argument) = node->Info();
       return 0;
-    }
-    case SimCall::kEccGetStats: {
-      auto* stats = static_cast<mtd_ecc_stats*>(argument);
-      *stats = mtd_ecc_stats{};
-      stats->failed = node->eccFailed;
-      stats->badblocks = node->badBlockCount;
+    case SimCall::kEccGetStats:
+      *static_cast<mtd_ecc_stats*>(argument) = node->Stats();
       return 0;
-    }
     case SimCall::kMemErase: {
-      auto* region = static_cast<erase_info_user*>(argument);
-      uint64_t start = region->start;
-      uint64_t length = region->length;
-      if (start >= size || length > size - start) {
-        errno = EINVAL;
-        return -1;
-      }
-      if (length == 0) return 0;
-      if (start % node->eraseSize != 0 || length % node->eraseSize != 0) {
-        errno = EINVAL;
-        return -1;
-      }
-      // Block by block: the blocks before a bad one are erased.
-      std::vector<uint8_t> erased(node->eraseSize, kErased);
-      for (uint64_t block = start; block < start + length; block += node->eraseSize) {
-        if (node->IsBadBlock(block)) {
-          if (block > start) node->erases.emplace_back(start, block - start);
-          errno = EIO;
-          return -1;
-        }
-        node->storage->Write(block, erased.data(), erased.size());
-      }
-      node->erases.emplace_back(start, length);
-      return 0;
+      const auto* region = static_cast<const erase_info_user*>(argument);
+      error = node->Erase(region->start, region->length);
+      break;
     }
     case SimCall::kMemGetBadBlock: {
-      uint64_t offset = static_cast<uint64_t>(*static_cast<loff_t*>(argument));
-      if (offset >= size) {
-        errno = EINVAL;
-        return -1;
-      }
-      if (node->kind != SimKind::kNand) return 0;
-      return node->IsBadBlock(offset) ? 1 : 0;
+      bool bad = false;
+      error = node->GetBadBlock(static_cast<uint64_t>(*static_cast<const loff_t*>(argument)), &bad);
+      if (error == 0) return bad ? 1 : 0;
+      break;
     }
-    case SimCall::kMemSetBadBlock: {
-      uint64_t offset = static_cast<uint64_t>(*static_cast<loff_t*>(argument));
-      if (node->kind != SimKind::kNand) {
-        errno = EOPNOTSUPP;
-        return -1;
-      }
-      if (offset >= size) {
-        errno = EINVAL;
-        return -1;
-      }
-      // The kernel erases the block before it writes the marker.
-      std::vector<uint8_t> erased(node->eraseSize, kErased);
-      node->storage->Write(node->BlockOf(offset), erased.data(), erased.size());
-      node->AddBad(offset, true);
-      return 0;
-    }
+    case SimCall::kMemSetBadBlock:
+      error = node->SetBadBlock(static_cast<uint64_t>(*static_cast<const loff_t*>(argument)));
+      break;
     default:
-      errno = ENOTTY;
-      return -1;
+      error = ENOTTY;
   }
+  if (error == 0) return 0;
+  errno = error;
+  return -1;
 }
 
-void* FlashSim::Map(size_t length, int fd, off64_t offset) {
+void* FlashSim::Map(size_t length, int protection, int flags, int fd, off64_t offset) {
   if (Hit(SimCall::kMmap)) return MAP_FAILED;
   auto it = handles_.find(fd);
+  if (it == handles_.end() && PassesThrough())
+    return Libc().mmap64(nullptr, length, protection, flags, fd, offset);
   if (it == handles_.end() || !it->second->devMem) {
     errno = EBADF;
     return MAP_FAILED;
@@ -779,6 +660,7 @@ void* FlashSim::Map(size_t length, int fd, off64_t offset) {
 
 int FlashSim::Unlink(const char* path) {
   if (Hit(SimCall::kUnlink)) return -1;
+  if (Find(path) == nullptr && PassesThrough()) return Libc().unlink(HostPath(path).c_str());
   if (nodes_.erase(path) == 0) {
     errno = ENOENT;
     return -1;
@@ -786,5 +668,5 @@ int FlashSim::Unlink(const char* path) {
   return 0;
 }
 
-}  // namespace test
+}  // namespace devmodel
 }  // namespace stbplat
