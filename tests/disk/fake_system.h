@@ -1,7 +1,8 @@
 // A simulated machine for the disk probes: block-device links, device nodes
-// with identity, size, SMART data and SCSI bus numbers, files and pipes. It
-// replaces the OS seam for its lifetime; anything it does not simulate fails
-// like a missing file.
+// answering the identity, size, SMART and SCSI bus requests, files and pipes
+// with fixed output. It replaces the OS seam for its lifetime; anything it
+// does not simulate fails like a missing file. Tests fill the public tables
+// and read back what the library did.
 #ifndef STBPLAT_TESTS_DISK_FAKE_SYSTEM_H
 #define STBPLAT_TESTS_DISK_FAKE_SYSTEM_H
 
@@ -10,6 +11,7 @@
 #include <memory>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "os/seam.h"
@@ -17,92 +19,45 @@
 namespace stbplat {
 namespace test {
 
-// What smartctl-free SMART reading returns: one attribute entry.
-struct SmartAttribute {
-  unsigned char id;
-  unsigned char current;
-  unsigned char worst;
-  std::array<unsigned char, 6> raw;
-};
+// One SMART attribute entry as the drive returns it (id, flags, current,
+// worst, six raw bytes, reserved).
+using SmartEntry = std::array<unsigned char, 12>;
 
 struct FakeDevice {
-  bool opens = true;
-  // BLKGETSIZE64
-  bool sizeFails = false;
-  unsigned long long size = 0;
-  // HDIO_GET_IDENTITY
-  bool identityFails = false;
-  std::string model;   // written at byte 54, space padded to 40
-  std::string serial;  // written at byte 20, space padded to 20
-  std::vector<unsigned char> identity;  // when set, used as the whole block
-  // HDIO_DRIVE_CMD (SMART READ DATA): entries placed from slot 0
-  bool smartFails = false;
-  std::vector<SmartAttribute> attributes;
-  // SCSI_IOCTL_GET_BUS_NUMBER
-  bool busFails = false;
-  int bus = 0;
+  long long size = 0;    // BLKGETSIZE64; the request fails when negative
+  std::string identity;  // the 512-byte identity block; the request fails when empty
+  int smartReads = 1000;  // SMART READ DATA succeeds this many times, then fails
+  std::vector<SmartEntry> attributes;  // from slot 0 of the attribute table
+  int bus = 0;  // SCSI_IOCTL_GET_BUS_NUMBER; the request fails when negative
 };
 
-class FakeSystem {
- public:
+struct FakeSystem {
   FakeSystem();
   ~FakeSystem();
-  FakeSystem(const FakeSystem&) = delete;
-  FakeSystem& operator=(const FakeSystem&) = delete;
 
-  static FakeSystem& Current();
+  std::map<std::string, std::string> links;   // /sys/class/block/<name> -> target
+  std::map<std::string, FakeDevice> devices;  // by path
+  std::map<std::string, std::string> files;   // readable with fopen64
+  // popen output: the first entry whose key the command contains; else empty.
+  std::vector<std::pair<std::string, std::string>> pipes;
+  bool pipeOpenFails = false;
+  bool pipeCloseFails = false;
+  int sleepsLeft = 1;  // sleep throws StopLoop when this reaches 0
 
-  // /sys/class/block/<name> -> target
-  void AddBlockLink(const std::string& name, const std::string& target);
-  FakeDevice& AddDevice(const std::string& path);
-  void AddFile(const std::string& path, const std::string& text);
-  // Pipes: with none registered and realPipes set, popen runs the command.
-  void SetPipeOutput(const std::string& commandPart, const std::string& output);
-  void FailPipeOpen(bool fail) { failPipeOpen_ = fail; }
-  void FailPipeClose(bool fail) { failPipeClose_ = fail; }
-  void UseRealPipes(bool real) { realPipes_ = real; }
-  // sleep throws StopLoop once it has been called this many times.
-  void StopAfterSleeps(int sleeps) { sleepsLeft_ = sleeps; }
-
-  const std::vector<std::string>& opened() const { return opened_; }
-  const std::vector<std::string>& commands() const { return commands_; }
-  const std::vector<std::string>& linksRead() const { return linksRead_; }
-  const std::vector<unsigned int>& sleeps() const { return sleepSeconds_; }
-  const std::vector<int>& openFlags() const { return openFlags_; }
-  const std::vector<mode_t>& openModes() const { return openModes_; }
-  size_t openDescriptors() const { return openFds_.size(); }
-  size_t openStreams() const { return openStreams_.size(); }
-  // The last SMART command block's first four bytes.
-  std::array<unsigned char, 4> lastDriveCommand() const { return lastDriveCommand_; }
-
- private:
-  friend struct FakeCalls;
-  std::map<std::string, std::string> links_;
-  std::map<std::string, FakeDevice> devices_;
-  std::map<std::string, std::string> files_;
-  std::vector<std::pair<std::string, std::string>> pipeOutputs_;
-  std::map<int, std::string> openFds_;
-  std::set<FILE*> openStreams_;
-  std::set<FILE*> pipes_;
-  std::vector<std::string> opened_;
-  std::vector<int> openFlags_;
-  std::vector<mode_t> openModes_;
-  std::vector<std::string> commands_;
-  std::vector<std::string> linksRead_;
-  std::vector<unsigned int> sleepSeconds_;
-  std::array<unsigned char, 4> lastDriveCommand_{};
-  bool failPipeOpen_ = false;
-  bool failPipeClose_ = false;
-  bool realPipes_ = false;
-  int sleepsLeft_ = 1;
-  int nextFd_ = 100;
-  std::unique_ptr<os::ScopedSysCalls> guard_;
+  std::vector<std::string> opened;  // open and fopen64 paths
+  std::vector<std::string> linksRead;
+  std::vector<std::string> commands;
+  std::vector<unsigned int> sleeps;
+  std::array<unsigned char, 4> lastDriveCommand{};
+  std::map<int, std::string> openFds;
+  std::set<FILE*> openStreams;  // files and pipes
+  std::unique_ptr<os::ScopedSysCalls> guard;
 };
 
 // Thrown by the fake sleep to leave an endless monitoring loop.
 struct StopLoop {};
 
-// A real ATA disk's link and a USB stick's link.
+// A real ATA disk's link and a USB disk's link.
 extern const char* const kAtaLink;
 extern const char* const kUsbLink;
 
