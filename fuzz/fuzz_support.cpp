@@ -1,7 +1,12 @@
 #include "fuzz_support.h"
 
+#include <unistd.h>
+
 #include <cstdarg>
 #include <cstdio>
+#include <string>
+
+#include "devmodel/flash_sim.h"
 
 extern "C" {
 
@@ -25,3 +30,68 @@ void GlobalLogUtilAdd(etLogUtilModuleId, unsigned int, const char*, unsigned int
 }
 
 }  // extern "C"
+
+namespace stbplat {
+namespace fuzz {
+namespace {
+
+constexpr const char* kRecordFile = "/data/record.bin";
+constexpr int kNorMtd = 0;
+constexpr uint64_t kNorSlotSize = 0x10000;
+constexpr const char kMap[] =
+    "[device NOR0]\n"
+    "technology = SPI_NOR\n"
+    "base = 0xE0000000\n"
+    "size = 0x10000\n"
+    "[partition NOR0.BOOT]\n"
+    "offset = 0\n"
+    "size = 0x10000\n"
+    "[slot NOR0.BOOT.INFO]\n"
+    "offset = 0\n"
+    "size = 0x10000\n"
+    "node = /dev/mtd0\n";
+
+// The emulated device, bound for the whole run, and its memory map.
+devmodel::FlashSim& Device() {
+  static devmodel::FlashSim* sim = [] {
+    auto* device = new devmodel::FlashSim;
+    device->AddMtd(kNorMtd, "flash0.BOOT.INFO", devmodel::SimKind::kNor, kNorSlotSize, kNorSlotSize);
+    char path[] = "/tmp/stbplat-fuzz-map-XXXXXX";
+    int fd = mkstemp(path);
+    std::string error;
+    if (fd < 0 || write(fd, kMap, sizeof kMap - 1) != static_cast<ssize_t>(sizeof kMap - 1) ||
+        !ExtendedMemoryMapStructure::Load(path, &error))
+      std::abort();
+    close(fd);
+    unlink(path);
+    return device;
+  }();
+  return *sim;
+}
+
+}  // namespace
+
+std::unique_ptr<Extruder> OpenSource(Source source, const unsigned char* data, size_t size) {
+  if (source == Source::kMemory) {
+    if (size > 0xFFFFFFFFu) return nullptr;
+    return std::make_unique<Extruder>(data, static_cast<unsigned int>(size));
+  }
+  if (size > kNorSlotSize) return nullptr;
+  devmodel::FlashSim& device = Device();
+  if (source == Source::kFile) {
+    device.AddFile(kRecordFile, std::vector<uint8_t>(data, data + size));
+    return std::make_unique<Extruder>(kRecordFile, false);
+  }
+  // Behind the input the slot reads erased.
+  std::vector<uint8_t> slot(kNorSlotSize, devmodel::kErasedByte);
+  std::copy(data, data + size, slot.begin());
+  device.Poke("/dev/mtd0", 0, slot);
+  ComponentLocation component;
+  component.location = Location(reinterpret_cast<const unsigned char*>("NOR0"),
+                                reinterpret_cast<const unsigned char*>("BOOT"),
+                                reinterpret_cast<const unsigned char*>("INFO"));
+  return std::make_unique<Extruder>(&component, false);
+}
+
+}  // namespace fuzz
+}  // namespace stbplat

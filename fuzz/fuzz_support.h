@@ -1,6 +1,6 @@
 // Shared pieces of the fuzz targets: a log sink that formats every message
-// (so a bad format argument is caught) and throws the text away, and the
-// round-trip property every target checks.
+// (so a bad format argument is caught) and throws the text away, the streams
+// an input is read from, and the round-trip property every target checks.
 #ifndef STBPLAT_FUZZ_FUZZ_SUPPORT_H
 #define STBPLAT_FUZZ_FUZZ_SUPPORT_H
 
@@ -8,6 +8,7 @@
 #include <cstdint>
 #include <cstdlib>
 #include <cstring>
+#include <memory>
 #include <vector>
 
 #include "stbplat/stbplat.h"
@@ -44,6 +45,26 @@ void CheckRoundTrip(const Record& first, ReadFn read, StoreFn store) {
   if (once != twice) std::abort();
 }
 
+// Where users meet records: a memory buffer, a slot file and a NOR slot of
+// the emulated device (both 64-bit addressed, positioned through the file
+// and the flash calls).
+enum class Source { kMemory, kFile, kNor };
+constexpr Source kSources[] = {Source::kMemory, Source::kFile, Source::kNor};
+
+// A stream over the input on source; null when the input does not fit it.
+std::unique_ptr<Extruder> OpenSource(Source source, const unsigned char* data, size_t size);
+
+// Reads a record from the input on every source; what reads must round-trip.
+template <typename Record, typename ReadFn, typename StoreFn>
+void FuzzRecord(const unsigned char* data, size_t size, ReadFn read, StoreFn store) {
+  for (Source source : kSources) {
+    std::unique_ptr<Extruder> in = OpenSource(source, data, size);
+    if (!in) continue;
+    Record record;
+    if (read(record, *in) == 0) CheckRoundTrip(record, read, store);
+  }
+}
+
 }  // namespace fuzz
 }  // namespace stbplat
 
@@ -52,12 +73,9 @@ void CheckRoundTrip(const Record& first, ReadFn read, StoreFn store) {
 // expression of `r` and `to`).
 #define STBPLAT_FUZZ_RECORD(Record, READ, STORE)                                         \
   extern "C" int LLVMFuzzerTestOneInput(const unsigned char* data, size_t size) {        \
-    if (size > 0xFFFFFFFFu) return 0;                                                   \
-    Extruder in(data, static_cast<unsigned int>(size));                                  \
-    Record record;                                                                       \
     auto read = [](Record& r, Extruder& from) { return READ; };                          \
     auto store = [](const Record& r, Intruder& to) { return STORE; };                    \
-    if (read(record, in) == 0) ::stbplat::fuzz::CheckRoundTrip(record, read, store);      \
+    ::stbplat::fuzz::FuzzRecord<Record>(data, size, read, store);                        \
     return 0;                                                                            \
   }
 

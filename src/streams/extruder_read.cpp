@@ -54,7 +54,9 @@ unsigned int ReadSource(Extruder& s, unsigned char* dst, unsigned int k) {
   if (s.isNorFlash) {
     unsigned long address = s.norBaseOffset + reinterpret_cast<std::uintptr_t>(s.getP());
     DeviceNorRead(address, dst, k);  // the NOR read reports nothing back
-    s.setP(s.getP() + k);
+    // The position is an offset held in the pointer, from null: it moves as
+    // an integer.
+    s.setP(reinterpret_cast<unsigned char*>(reinterpret_cast<std::uintptr_t>(s.getP()) + k));
   } else if (s.isNand) {
     if (!DeviceNandRead(dst, k, s.partitionName, s.currNandOffset)) return kExtrudeFailed;
   } else if (s.isEMMC) {

@@ -33,7 +33,9 @@ unsigned int WriteTarget(Intruder& s, const unsigned char* bytes, unsigned int k
   } else if (s.isNorFlash) {
     unsigned long address = s.norBaseOffset + reinterpret_cast<std::uintptr_t>(s.getP());
     DeviceNorWrite(address, bytes, k);  // the NOR write reports nothing back
-    s.setP(s.getP() + k);
+    // The position is an offset held in the pointer, from null: it moves as
+    // an integer.
+    s.setP(reinterpret_cast<unsigned char*>(reinterpret_cast<std::uintptr_t>(s.getP()) + k));
     return kIntrudeOk;  // the device offset does not move in this mode
   } else {
     long position = Sys().ftell(s.pFile);
