@@ -1,12 +1,14 @@
-// The emulated device of host mode, driven through the library's OS seam as
-// the library drives a real one.
+// Host mode: the emulated device over a device root's image files, driven
+// through the library's OS seam as the library drives a real one. The device
+// rules themselves are pinned in tests/flash/kernel_rules_test.cpp; here is
+// what the image files add: windows into chip images, OOB dumps, bad-block
+// lists and markers that persist, and the paths outside the device.
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <mtd/mtd-user.h>
 #include <sys/ioctl.h>
 
 #include <cerrno>
-#include <cstring>
 #include <string>
 #include <vector>
 
@@ -17,30 +19,30 @@
 namespace {
 
 using stbplat::os::Sys;
-using stbplat::test::ScratchDir;
+using Bytes = std::vector<unsigned char>;
 
 constexpr size_t kNorSize = 64 * 1024;
-constexpr size_t kNorSector = 16 * 1024;
 constexpr size_t kPage = 512;
 constexpr size_t kOob = 16;
 constexpr size_t kBlock = 4 * kPage;
 constexpr size_t kNandSize = 8 * kBlock;
+const char kTableHeader[] = "dev:    size   erasesize  name\n";
 
-std::vector<unsigned char> Pattern(size_t size, unsigned char seed) {
-  std::vector<unsigned char> bytes(size);
+Bytes Pattern(size_t size, unsigned char seed) {
+  Bytes bytes(size);
   for (size_t i = 0; i < size; ++i) bytes[i] = static_cast<unsigned char>(seed + i * 7);
   return bytes;
 }
 
-// NAND data laid out page by page with OOB bytes behind each page.
-std::vector<unsigned char> WithOob(const std::vector<unsigned char>& data, std::vector<unsigned> badBlocks) {
-  std::vector<unsigned char> out;
+// NAND data page by page with OOB bytes behind each page, as nanddump --oob
+// writes it; a bad block has 0x00 in the first OOB byte of its first page.
+Bytes WithOob(const Bytes& data, unsigned badBlock) {
+  Bytes out;
   for (size_t page = 0; page < data.size() / kPage; ++page) {
     out.insert(out.end(), data.begin() + static_cast<long>(page * kPage),
                data.begin() + static_cast<long>((page + 1) * kPage));
-    std::vector<unsigned char> oob(kOob, 0xFF);
-    for (unsigned bad : badBlocks)
-      if (page == bad * kBlock / kPage) oob[0] = 0x00;
+    Bytes oob(kOob, 0xFF);
+    if (page == badBlock * kBlock / kPage) oob[0] = 0x00;
     out.insert(out.end(), oob.begin(), oob.end());
   }
   return out;
@@ -49,240 +51,166 @@ std::vector<unsigned char> WithOob(const std::vector<unsigned char>& data, std::
 class HostModeTest : public ::testing::Test {
  protected:
   void SetUp() override {
-    dir.Write("proc/mtd",
-              "dev:    size   erasesize  name\n"
-              "mtd0: 00010000 00004000 \"flash0\"\n"
-              "mtd1: 00004000 00004000 \"flash0.BOOT.A\"\n"
-              "mtd2: 00004000 00000800 \"flash1\"\n"
-              "mtd3: 00001000 00000800 \"flash1.KERNEL.A\"\n"
-              "mtd4: 00004000 00000800 \"NAND1...\"\n");
-    nor = Pattern(kNorSize, 1);
-    dir.Write("dev/mtd0", nor);
+    dir.Write("proc/mtd", std::string(kTableHeader) +
+                              "mtd0: 00010000 00004000 \"flash0\"\n"
+                              "mtd1: 00004000 00004000 \"flash0.BOOT.A\"\n"
+                              "mtd2: 00004000 00000800 \"flash1\"\n"
+                              "mtd3: 00001000 00000800 \"flash1.KERNEL.A\"\n"
+                              "mtd4: 00004000 00000800 \"NAND1...\"\n");
+    dir.Write("dev/mtd0", Pattern(kNorSize, 1));
     dir.Write("dev/mtd1.ini", "image = mtd0\noffset = 0x4000\n");
-    nand = Pattern(kNandSize, 3);
-    dir.Write("dev/mtd2", WithOob(nand, {2}));
+    dir.Write("dev/mtd2", WithOob(nand, 2));
     dir.Write("dev/mtd2.ini", "medium = nand\nwritesize = 512\noobsize = 16\n");
     dir.Write("dev/mtd3.ini", "image = mtd2\noffset = 0x1000\n");
     dir.Write("dev/mtd4", Pattern(kNandSize, 5));
     dir.Write("dev/mtd4.ini", "medium = nand\nwritesize = 512\noobsize = 16\n");
     dir.Write("dev/mtd4.bad", "# factory\n1\n6\n");
-    std::string error;
-    ASSERT_TRUE(stbplat::hostsim::Attach(dir.path(), &error)) << error;
+    dir.Write("dev/mmca", Pattern(kBlock, 9));
+    dir.Write("dev/mmca.ini", "medium = emmc\nsize = 2048\n");
+    Attach();
   }
   void TearDown() override { stbplat::hostsim::Detach(); }
 
-  int Open(const char* path) { return Sys().open(path, O_RDWR | O_SYNC, 0644); }
-
-  std::vector<unsigned char> ReadAt(int fd, off64_t offset, size_t n) {
-    std::vector<unsigned char> bytes(n);
-    EXPECT_EQ(offset, Sys().lseek64(fd, offset, SEEK_SET));
-    EXPECT_EQ(static_cast<ssize_t>(n), Sys().read(fd, bytes.data(), n));
+  void Attach() {
+    std::string error;
+    ASSERT_TRUE(stbplat::hostsim::Attach(dir.path(), &error)) << error;
+  }
+  // Opens path, positioned at offset.
+  int OpenAt(const char* path, off64_t offset) {
+    int fd = Sys().open(path, O_RDWR, 0);
+    EXPECT_EQ(offset, Sys().lseek64(fd, offset, SEEK_SET)) << path;
+    return fd;
+  }
+  Bytes ReadAt(const char* path, off64_t offset, size_t n) {
+    Bytes bytes(n);
+    int fd = OpenAt(path, offset);
+    bytes.resize(static_cast<size_t>(std::max<ssize_t>(0, Sys().read(fd, bytes.data(), n))));
+    Sys().close(fd);
     return bytes;
   }
+  int Request(const char* path, unsigned long request, long long offset) {
+    int fd = Sys().open(path, O_RDWR, 0);
+    int result = Sys().ioctl(fd, request, &offset);
+    Sys().close(fd);
+    return result;
+  }
 
-  int IsBad(int fd, long long offset) { return Sys().ioctl(fd, MEMGETBADBLOCK, &offset); }
-
-  ScratchDir dir;
-  std::vector<unsigned char> nor, nand;
+  stbplat::test::ScratchDir dir;
+  Bytes nand = Pattern(kNandSize, 3);
 };
 
-TEST_F(HostModeTest, PartitionInfoComesFromTheTableAndTheImage) {
-  int fd = Open("/dev/mtd3");
-  ASSERT_GE(fd, 0);
+TEST_F(HostModeTest, WindowsTakeTheTablesSizeAndTheImagesGeometry) {
+  int fd = Sys().open("/dev/mtd3", O_RDONLY, 0);
   mtd_info_user info;
   ASSERT_EQ(0, Sys().ioctl(fd, MEMGETINFO, &info));
+  Sys().close(fd);
   EXPECT_EQ(MTD_NANDFLASH, info.type);
   EXPECT_EQ(0x1000u, info.size);
   EXPECT_EQ(kBlock, info.erasesize);
   EXPECT_EQ(kPage, info.writesize);
   EXPECT_EQ(kOob, info.oobsize);
-  EXPECT_EQ(0, Sys().close(fd));
 
-  fd = Open("/dev/mtd0");
-  ASSERT_EQ(0, Sys().ioctl(fd, MEMGETINFO, &info));
-  EXPECT_EQ(MTD_NORFLASH, info.type);
-  EXPECT_EQ(kNorSector, info.erasesize);
+  Bytes nor = Pattern(kNorSize, 1);
+  EXPECT_EQ(Bytes(nor.begin() + 0x4000, nor.begin() + 0x4010), ReadAt("/dev/mtd1", 0, 16));
+  EXPECT_EQ(8u, ReadAt("/dev/mtd1", 0x4000 - 8, 32).size());
+  // Across a page boundary of the dump: the OOB bytes between are not data.
+  EXPECT_EQ(Bytes(nand.begin() + kPage - 4, nand.begin() + kPage + 4), ReadAt("/dev/mtd2", kPage - 4, 8));
+  // A write through the window lands in the chip image at the window's place.
+  fd = OpenAt("/dev/mtd1", 100);
+  const unsigned char zero = 0;
+  ASSERT_EQ(1, Sys().write(fd, &zero, 1));
   Sys().close(fd);
+  EXPECT_EQ(0, dir.Read("dev/mtd0")[0x4000 + 100]);
 }
 
-TEST_F(HostModeTest, WindowsReadTheirPartOfTheImageAndStopAtTheirEnd) {
-  int fd = Open("/dev/mtd1");
-  ASSERT_GE(fd, 0);
-  EXPECT_EQ(std::vector<unsigned char>(nor.begin() + 0x4000, nor.begin() + 0x4010), ReadAt(fd, 0, 16));
-  unsigned char tail[32];
-  ASSERT_EQ(0x4000 - 8, Sys().lseek64(fd, 0x4000 - 8, SEEK_SET));
-  EXPECT_EQ(8, Sys().read(fd, tail, sizeof tail));
-  EXPECT_EQ(0, Sys().read(fd, tail, sizeof tail));
-  Sys().close(fd);
-}
-
-TEST_F(HostModeTest, OobDumpReadsAsPlainDataAndMarksBadBlocksByTheFirstOobByte) {
-  int fd = Open("/dev/mtd2");
-  ASSERT_GE(fd, 0);
-  // Across a page boundary: the OOB bytes between the pages are not data.
-  EXPECT_EQ(std::vector<unsigned char>(nand.begin() + kPage - 4, nand.begin() + kPage + 4), ReadAt(fd, kPage - 4, 8));
-  EXPECT_EQ(0, IsBad(fd, 0));
-  EXPECT_EQ(1, IsBad(fd, 2 * kBlock));
-  EXPECT_EQ(1, IsBad(fd, 2 * kBlock + kPage));  // any offset inside the block
-  EXPECT_EQ(0, IsBad(fd, 3 * kBlock));
-  long long outside = kNandSize;
-  EXPECT_EQ(-1, Sys().ioctl(fd, MEMGETBADBLOCK, &outside));
-  EXPECT_EQ(EINVAL, errno);
+TEST_F(HostModeTest, BadBlocksComeFromTheDumpsMarkersAndTheList) {
+  EXPECT_EQ(0, Request("/dev/mtd2", MEMGETBADBLOCK, 0));
+  EXPECT_EQ(1, Request("/dev/mtd2", MEMGETBADBLOCK, 2 * kBlock + kPage));
+  EXPECT_EQ(1, Request("/dev/mtd3", MEMGETBADBLOCK, 0));  // the window starts at block 2
+  EXPECT_EQ(1, Request("/dev/mtd4", MEMGETBADBLOCK, 6 * kBlock));
+  EXPECT_EQ(0, Request("/dev/mtd4", MEMGETBADBLOCK, 5 * kBlock));
+  int fd = Sys().open("/dev/mtd2", O_RDONLY, 0);
   mtd_ecc_stats stats;
   ASSERT_EQ(0, Sys().ioctl(fd, ECCGETSTATS, &stats));
+  Sys().close(fd);
   EXPECT_EQ(1u, stats.badblocks);
-  EXPECT_EQ(0u, stats.failed);
-  Sys().close(fd);
-
-  // The window at 0x1000 starts at block 2 of the chip.
-  fd = Open("/dev/mtd3");
-  EXPECT_EQ(1, IsBad(fd, 0));
-  EXPECT_EQ(0, IsBad(fd, kBlock));
-  Sys().close(fd);
 }
 
-TEST_F(HostModeTest, PlainNandTakesItsBadBlocksFromTheList) {
-  int fd = Open("/dev/mtd4");
-  ASSERT_GE(fd, 0);
-  EXPECT_EQ(0, IsBad(fd, 0));
-  EXPECT_EQ(1, IsBad(fd, kBlock));
-  EXPECT_EQ(1, IsBad(fd, 6 * kBlock));
-  long long block3 = 3 * kBlock;
-  ASSERT_EQ(0, Sys().ioctl(fd, MEMSETBADBLOCK, &block3));
-  Sys().close(fd);
+TEST_F(HostModeTest, MarksAndErasesReachTheImagesAndLastBeyondTheRun) {
+  ASSERT_EQ(0, Request("/dev/mtd2", MEMSETBADBLOCK, 5 * kBlock));
+  ASSERT_EQ(0, Request("/dev/mtd4", MEMSETBADBLOCK, 3 * kBlock));
+  Bytes dump = dir.Read("dev/mtd2");
+  size_t block5 = 5 * (kBlock / kPage) * (kPage + kOob);
+  EXPECT_EQ(0x00, dump[block5 + kPage]);  // the marker, in an erased block
+  EXPECT_EQ(Bytes(kPage, 0xFF), Bytes(dump.begin() + block5, dump.begin() + block5 + kPage));
 
-  // Marked bad stays bad for the next user of the image.
   stbplat::hostsim::Detach();
-  std::string error;
-  ASSERT_TRUE(stbplat::hostsim::Attach(dir.path(), &error)) << error;
-  fd = Open("/dev/mtd4");
-  EXPECT_EQ(1, IsBad(fd, 3 * kBlock));
-  Sys().close(fd);
+  Attach();
+  EXPECT_EQ(1, Request("/dev/mtd2", MEMGETBADBLOCK, 5 * kBlock));
+  EXPECT_EQ(1, Request("/dev/mtd4", MEMGETBADBLOCK, 3 * kBlock));
 }
 
-TEST_F(HostModeTest, MarkingBadInAnOobDumpWritesTheMarkerByte) {
-  int fd = Open("/dev/mtd2");
-  long long block5 = 5 * kBlock;
-  ASSERT_EQ(0, Sys().ioctl(fd, MEMSETBADBLOCK, &block5));
-  Sys().close(fd);
-  std::vector<unsigned char> dump = dir.Read("dev/mtd2");
-  EXPECT_EQ(0x00, dump[5 * (kBlock / kPage) * (kPage + kOob) + kPage]);
-}
-
-TEST_F(HostModeTest, ProgrammingClearsBitsOnlyAndEraseSetsABlockToOnes) {
-  int fd = Open("/dev/mtd1");
-  ASSERT_GE(fd, 0);
-  erase_info_user region = {0, static_cast<__u32>(kNorSector)};
-  ASSERT_EQ(0, Sys().ioctl(fd, MEMERASE, &region));
-  EXPECT_EQ(std::vector<unsigned char>(4, 0xFF), ReadAt(fd, 100, 4));
-  const unsigned char first[] = {0xF0, 0x0F, 0xFF, 0x00};
-  const unsigned char second[] = {0x3C, 0xFF, 0x0F, 0xFF};
-  Sys().lseek64(fd, 100, SEEK_SET);
-  ASSERT_EQ(4, Sys().write(fd, first, 4));
-  Sys().lseek64(fd, 100, SEEK_SET);
-  ASSERT_EQ(4, Sys().write(fd, second, 4));
-  EXPECT_EQ((std::vector<unsigned char>{0x30, 0x0F, 0x0F, 0x00}), ReadAt(fd, 100, 4));
-
-  erase_info_user unaligned = {100, static_cast<__u32>(kNorSector)};
-  EXPECT_EQ(-1, Sys().ioctl(fd, MEMERASE, &unaligned));
-  EXPECT_EQ(EINVAL, errno);
-  Sys().close(fd);
-  // The window wrote into the chip image at its offset.
-  EXPECT_EQ(0x30, dir.Read("dev/mtd0")[0x4000 + 100]);
-}
-
-TEST_F(HostModeTest, NandFollowsTheKernelAtItsEdges) {
-  int fd = Open("/dev/mtd2");
-  std::vector<unsigned char> page(kPage, 0x00);
-  Sys().lseek64(fd, 10, SEEK_SET);
-  EXPECT_EQ(-1, Sys().write(fd, page.data(), kPage));
-  EXPECT_EQ(EINVAL, errno);
-  // Erasing blocks 1 and 2 (bad) erases block 1, then fails.
-  Sys().lseek64(fd, kBlock, SEEK_SET);
-  ASSERT_EQ(static_cast<ssize_t>(kPage), Sys().write(fd, page.data(), kPage));
-  erase_info_user across = {static_cast<__u32>(kBlock), static_cast<__u32>(2 * kBlock)};
-  EXPECT_EQ(-1, Sys().ioctl(fd, MEMERASE, &across));
-  EXPECT_EQ(EIO, errno);
-  EXPECT_EQ(std::vector<unsigned char>(4, 0xFF), ReadAt(fd, kBlock, 4));
-  erase_info_user empty = {static_cast<__u32>(kBlock + 10), 0};
-  EXPECT_EQ(0, Sys().ioctl(fd, MEMERASE, &empty));
-  // Writes ignore the bad-block table, and are cut at the end.
-  Sys().lseek64(fd, 2 * kBlock + kPage, SEEK_SET);
-  EXPECT_EQ(static_cast<ssize_t>(kPage), Sys().write(fd, page.data(), kPage));
-  EXPECT_EQ(1, IsBad(fd, 2 * kBlock));
-  std::vector<unsigned char> two(2 * kPage, 0x00);
-  Sys().lseek64(fd, kNandSize - kPage, SEEK_SET);
-  EXPECT_EQ(static_cast<ssize_t>(kPage), Sys().write(fd, two.data(), two.size()));
-  EXPECT_EQ(-1, Sys().write(fd, two.data(), kPage));
-  EXPECT_EQ(ENOSPC, errno);
-
-  erase_info_user good = {static_cast<__u32>(kBlock), static_cast<__u32>(kBlock)};
-  ASSERT_EQ(0, Sys().ioctl(fd, MEMERASE, &good));
-  Sys().lseek64(fd, kBlock, SEEK_SET);
-  ASSERT_EQ(static_cast<ssize_t>(kPage), Sys().write(fd, page.data(), kPage));
-  EXPECT_EQ(0, IsBad(fd, kBlock));  // erasing left the OOB marker erased
-  EXPECT_EQ(std::vector<unsigned char>(4, 0x00), ReadAt(fd, kBlock, 4));
-  EXPECT_EQ(std::vector<unsigned char>(4, 0xFF), ReadAt(fd, kBlock + kPage, 4));
-  Sys().close(fd);
-}
-
-TEST_F(HostModeTest, DevicePathsLieUnderTheRootAndOthersPassThrough) {
+TEST_F(HostModeTest, OtherPathsLieUnderTheRootOrPassThrough) {
   FILE* table = Sys().fopen64("/proc/mtd", "r");
   ASSERT_NE(nullptr, table);
   char line[100];
   ASSERT_NE(nullptr, Sys().fgets(line, sizeof line, table));
-  EXPECT_STREQ("dev:    size   erasesize  name\n", line);
+  EXPECT_STREQ(kTableHeader, line);
+  ASSERT_NE(nullptr, Sys().fgets(line, sizeof line, table));
+  EXPECT_STREQ("mtd0: 00010000 00004000 \"flash0\"\n", line);
   Sys().fclose(table);
 
-  EXPECT_EQ(-1, Open("/dev/mtd9"));
-  EXPECT_EQ(ENOENT, errno);
-  EXPECT_EQ(-1, Sys().open("/dev/mmca", O_RDONLY, 0));  // no eMMC image in this root
-  EXPECT_EQ(nullptr, Sys().popen("true", "r"));
+  // The eMMC device is its image; writes past its end are cut.
+  Bytes mmc = Pattern(kBlock, 9);
+  EXPECT_EQ(Bytes(mmc.begin() + 100, mmc.begin() + 104), ReadAt("/dev/mmca", 100, 4));
+  int fd = OpenAt("/dev/mmca", kBlock - 2);
+  EXPECT_EQ(2, Sys().write(fd, "abcd", 4));
+  Sys().close(fd);
 
-  std::string outside = dir.Write("outside.txt", "plain file");
-  FILE* file = Sys().fopen64(outside.c_str(), "r");
+  errno = 0;
+  EXPECT_EQ(-1, Sys().open("/dev/mtd9", O_RDONLY, 0));
+  EXPECT_EQ(ENOENT, errno);
+  EXPECT_EQ(nullptr, Sys().popen("true", "r"));
+  FILE* file = Sys().fopen64(dir.Write("outside.txt", "plain file").c_str(), "r");
   ASSERT_NE(nullptr, file);
   Sys().fclose(file);
-}
 
-TEST_F(HostModeTest, DetachPutsTheCLibraryBack) {
   stbplat::hostsim::Detach();
   EXPECT_FALSE(stbplat::hostsim::IsAttached());
   EXPECT_EQ(stbplat::os::LibcSysCalls().open, Sys().open);
 }
 
 TEST(HostModeAttach, ReportsWhichFileIsWrong) {
-  ScratchDir dir;
+  stbplat::test::ScratchDir dir;
   std::string error;
-  EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
-  EXPECT_NE(std::string::npos, error.find("proc/mtd")) << error;
-
-  dir.Write("proc/mtd", "dev:    size   erasesize  name\nmtd0: 00010000 00004000 \"flash0\"\n");
-  dir.Write("dev/mtd0", std::string(100, 'x'));
-  EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
-  EXPECT_NE(std::string::npos, error.find("dev/mtd0: 100 bytes, expected 65536")) << error;
-
-  // A NAND dump with OOB that is a block short: nanddump's default left the
-  // bad block out.
-  dir.Write("proc/mtd", "dev:    size   erasesize  name\nmtd0: 00010000 00004000 \"flash1\"\n");
-  dir.Write("dev/mtd0.ini", "medium = nand\nwritesize = 512\noobsize = 16\n");
-  dir.Write("dev/mtd0", std::string(3 * 32 * (512 + 16), 'x'));
-  EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
-  EXPECT_NE(std::string::npos, error.find("take it with nanddump --oob --bb=dumpbad")) << error;
-
-  dir.Write("proc/mtd", "dev:    size   erasesize  name\nmtd0: 00010000 00004000 \"flash0\"\n");
-  dir.Write("dev/mtd0", std::vector<unsigned char>(0x10000, 0xFF));
-  dir.Write("dev/mtd0.ini", "medium = flash\n");
-  EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
-  EXPECT_NE(std::string::npos, error.find("medium = flash")) << error;
-
-  dir.Write("dev/mtd0.ini", "medium = nor\n");
-  EXPECT_TRUE(stbplat::hostsim::Attach(dir.path(), &error)) << error;
-  stbplat::hostsim::Detach();
-
-  dir.Write("memory-map.ini", "[device NOR0]\ntechnology = SPI_NOR.\nsize = 0x10000\n");
-  EXPECT_FALSE(stbplat::hostsim::Attach(dir.path(), &error));
-  EXPECT_NE(std::string::npos, error.find("needs technology, base and size")) << error;
+  std::string table = std::string(kTableHeader) + "mtd0: 00010000 00004000 \"flash0\"\n";
+  struct Case {
+    const char* file;
+    std::string contents;
+    const char* message;
+  };
+  const Case cases[] = {
+      {"README", "", "proc/mtd: cannot be read"},
+      {"proc/mtd", table, "dev/mtd0: No such file"},
+      {"dev/mtd0", std::string(100, 'x'), "dev/mtd0: 100 bytes, expected 65536"},
+      {"dev/mtd0.ini", "medium = flash\n", "medium = flash"},
+      // A NAND dump with OOB a block short: nanddump's default left the bad
+      // block out.
+      {"dev/mtd0.ini", "medium = nand\nwritesize = 512\noobsize = 16\n", "expected 65536"},
+      {"dev/mtd0", std::string(3 * 32 * (512 + 16), 'x'), "take it with nanddump --oob --bb=dumpbad"},
+      {"dev/mtd0.ini", "medium = nor\n", "bytes, expected 65536"},
+      {"dev/mtd0", std::string(0x10000, 'x'), ""},
+      {"memory-map.ini", "[device NOR0]\ntechnology = SPI_NOR.\nsize = 0x10000\n",
+       "needs technology, base and size"},
+  };
+  for (const Case& c : cases) {
+    dir.Write(c.file, c.contents);
+    error.clear();
+    bool attached = stbplat::hostsim::Attach(dir.path(), &error);
+    EXPECT_EQ(*c.message == '\0', attached) << c.file << ": " << error;
+    EXPECT_NE(std::string::npos, error.find(c.message)) << c.file << ": " << error;
+    stbplat::hostsim::Detach();
+  }
 }
 
 }  // namespace
