@@ -74,12 +74,6 @@ std::vector<std::string> LogCapture::texts() const {
   return out;
 }
 
-std::string LogCapture::all() const {
-  std::string out;
-  for (const LogMessage& m : Store()) out += m.text;
-  return out;
-}
-
 bool LogCapture::Contains(const std::string& text) const {
   for (const LogMessage& m : Store())
     if (m.text.find(text) != std::string::npos) return true;

@@ -34,8 +34,6 @@ class LogCapture {
   const std::vector<LogMessage>& messages() const;
   // Formatted texts, in order.
   std::vector<std::string> texts() const;
-  // All formatted texts concatenated.
-  std::string all() const;
   bool Contains(const std::string& text) const;
   void Clear();
 

@@ -1,0 +1,75 @@
+// The utilities' exported functions: the hex dump, the string and address
+// checks and the start-up entry points.
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+#include "stbplat/display_utils.h"
+#include "stbplat/string_checks.h"
+#include "stbplat/subsystem_init.h"
+#include "support/log_capture.h"
+
+// Stands in for the platform library's entry point in this executable, so the
+// test sees what ZanSubSystemInit passes on and returns.
+extern "C" int StartTokenAgingThread(void) { return 71; }
+
+namespace {
+
+using stbplat::test::LogCapture;
+
+TEST(DumpBuffer, LinesOfSixteenPaddedWithDotsForTheUnprintable) {
+  LogCapture capture;
+  std::vector<unsigned char> bytes(17, 0xAB);
+  bytes[16] = 'z';
+  DumpBuffer(eLogModuleRecords, 0, bytes.data(), 17);
+  DumpBuffer(eLogModuleRecords, 200, bytes.data(), 1);  // the indent is clamped to 103
+  DumpBuffer(eLogModuleRecords, 4, nullptr, 5);
+  DumpBuffer(eLogModuleRecords, 4, bytes.data(), 0);
+  EXPECT_EQ(capture.texts(),
+            (std::vector<std::string>{
+                "AB AB AB AB AB AB AB AB AB AB AB AB AB AB AB AB      ................\r\n",
+                "7A " + std::string(45, ' ') + "     z" + std::string(15, ' ') + "\r\n",
+                std::string(103, ' ') + "AB " + std::string(50, ' ') + "." + std::string(15, ' ') +
+                    "\r\n",
+                "<none>\r\n", "<none>\r\n"}));
+  EXPECT_EQ(capture.messages()[0].level, 4u);
+  EXPECT_EQ(capture.messages()[0].function, "DumpBuffer");
+  capture.Clear();
+  capture.SetLevel(eLogModuleRecords, 3);
+  DumpBuffer(eLogModuleRecords, 0, bytes.data(), 17);
+  DumpBuffer(eLogModuleCount, 0, bytes.data(), 17);  // no level to gate it with
+  EXPECT_TRUE(capture.messages().empty());
+}
+
+TEST(StringChecks, BoundedSearchAllowedSetAndAddresses) {
+  const char text[] = {'a', '\0', 'b', 'x'};
+  EXPECT_EQ(strnchr(text, 3, 'x'), text + 3);  // n + 1 bytes, past a 0 byte
+  EXPECT_EQ(strnchr(text, 2, 'x'), nullptr);
+  EXPECT_TRUE(StrSecurityCheck("azAZ09./=_ \":-", 14));
+  for (const char* bad : {";", "$", "`", "|", "&", ">", "\n", "'", "\\", "*", "(", "\x80"})
+    EXPECT_FALSE(StrSecurityCheck(bad, 1)) << static_cast<int>(static_cast<unsigned char>(*bad));
+  EXPECT_TRUE(StrSecurityCheck("ab;", 2));
+  EXPECT_TRUE(StrSecurityCheck("a\0b", 3));  // a 0 byte among the len bytes passes
+  EXPECT_TRUE(IsValidIpAddress("192.168.1.10"));
+  EXPECT_FALSE(IsValidIpAddress("192.168.1.256"));
+  for (const char* net : {"255.255.255.0", "1.2.3.", "999.1.2.3", "..."})
+    EXPECT_TRUE(IsValidSubNet(net)) << net;
+  for (const char* net : {"1.2.3", "a.b.c.d", "1.2.3.4.5", "1.2.3.-4", ""})
+    EXPECT_FALSE(IsValidSubNet(net)) << net;
+  EXPECT_TRUE(IsValidSubNet(std::string(259, '.').c_str()));  // the count is kept in 8 bits
+}
+
+TEST(SubsystemInit, ZanForwardsToThePlatformHWSpecificLogsATrace) {
+  EXPECT_EQ(ZanSubSystemInit(), 71);
+  LogCapture capture;
+  HWSpecificInit();
+  EXPECT_EQ(capture.texts(), std::vector<std::string>{"HW Specific Init\n"});
+  const stbplat::test::LogMessage& m = capture.messages().at(0);
+  EXPECT_EQ(m.module, 11);
+  EXPECT_EQ(m.level, 6u);
+  EXPECT_EQ(m.sourceFile, "HWSpecific");
+  EXPECT_EQ(m.function, "HWSpecificInit");
+}
+
+}  // namespace
