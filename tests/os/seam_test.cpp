@@ -1,60 +1,36 @@
 #include "os/seam.h"
 
-#include <fcntl.h>
 #include <gtest/gtest.h>
+
+#include <vector>
 
 namespace {
 
-using stbplat::os::LibcSysCalls;
-using stbplat::os::ScopedFd;
-using stbplat::os::ScopedSysCalls;
-using stbplat::os::Sys;
-using stbplat::os::SysCalls;
+namespace os = stbplat::os;
 
-int g_closed = -1;
-int RecordClose(int fd) {
-  g_closed = fd;
-  return 0;
-}
-int RefuseOpen(const char*, int, mode_t) { return -1; }
+std::vector<int> g_closed;
 
-TEST(OsSeam, GuardSwapsAndRestoresTheTable) {
-  EXPECT_EQ(Sys().open, LibcSysCalls().open);
+TEST(OsSeam, GuardsNestAndRestoreScopedFdClosesThroughTheSeamOnce) {
+  os::SysCalls calls = os::LibcSysCalls();
+  calls.close = [](int fd) {
+    g_closed.push_back(fd);
+    return 0;
+  };
   {
-    SysCalls calls = LibcSysCalls();
-    calls.open = RefuseOpen;
-    ScopedSysCalls guard(calls);
-    EXPECT_EQ(Sys().open("/dev/null", O_RDONLY, 0), -1);
+    os::ScopedSysCalls guard(calls);
     {
-      SysCalls inner = Sys();
-      inner.close = RecordClose;
-      ScopedSysCalls nested(inner);
-      EXPECT_EQ(Sys().open, RefuseOpen);
+      os::SysCalls inner = os::Sys();
+      inner.open = [](const char*, int, mode_t) { return -1; };
+      os::ScopedSysCalls nested(inner);
+      EXPECT_EQ(os::Sys().open("/dev/null", 0, 0), -1);
+      os::ScopedFd fd(42);
+      os::ScopedFd none(-1);
+      fd.Reset();
     }
-    EXPECT_EQ(Sys().close, LibcSysCalls().close);
+    EXPECT_EQ(os::Sys().close, calls.close);  // the outer table again
   }
-  EXPECT_EQ(Sys().open, LibcSysCalls().open);
-  int fd = Sys().open("/dev/null", O_RDONLY, 0);
-  ASSERT_GE(fd, 0);
-  Sys().close(fd);
-}
-
-TEST(OsSeam, ScopedFdClosesThroughTheSeamOnce) {
-  SysCalls calls = LibcSysCalls();
-  calls.close = RecordClose;
-  ScopedSysCalls guard(calls);
-  g_closed = -1;
-  {
-    ScopedFd fd(42);
-    EXPECT_TRUE(fd.valid());
-  }
-  EXPECT_EQ(g_closed, 42);
-  g_closed = -1;
-  {
-    ScopedFd none(-1);
-    EXPECT_FALSE(none.valid());
-  }
-  EXPECT_EQ(g_closed, -1);
+  EXPECT_EQ(g_closed, std::vector<int>{42});
+  EXPECT_EQ(os::Sys().close, os::LibcSysCalls().close);
 }
 
 }  // namespace
