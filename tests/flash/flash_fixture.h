@@ -6,6 +6,8 @@
 #include <gtest/gtest.h>
 
 #include <cstdio>
+#include <fstream>
+#include <iterator>
 #include <string>
 #include <vector>
 
@@ -28,76 +30,10 @@ constexpr unsigned long kSdramBase = 0x30000000UL;
 constexpr const char* kNandData = "/dev/mtd2";
 constexpr const char* kEmmcNode = "/dev/mmca";
 
-inline const char* DeviceMap() {
-  return "; the test device\n"
-         "[device NOR0]\n"
-         "technology = SPI_NOR\n"
-         "base = 0xE0000000\n"
-         "size = 0x400000\n"
-         "[partition NOR0.BOOT]\n"
-         "offset = 0\n"
-         "size = 0x80000\n"
-         "node = /dev/mtd8\n"
-         "[slot NOR0.BOOT.FSBL]\n"
-         "offset = 0\n"
-         "size = 0x30000\n"
-         "node = /dev/mtd0\n"
-         "[slot NOR0.BOOT.CONFIG]\n"
-         "offset = 0x40000\n"
-         "size = 0x40000\n"
-         "node = /dev/mtd1\n"
-         "[partition NOR0.MISC]\n"
-         "offset = 0x80000\n"
-         "size = 0x10000\n"
-         "[slot NOR0.MISC.TINY]\n"
-         "offset = 0\n"
-         "size = 0x8000\n"
-         "[device NAND0]\n"
-         "technology = NAND\n"
-         "base = 0x0\n"
-         "size = 0x200000\n"
-         "[partition NAND0.SYS]\n"
-         "offset = 0\n"
-         "size = 0x200000\n"
-         "[slot NAND0.SYS.DATA]\n"
-         "offset = 0\n"
-         "size = 0x100000\n"
-         "node = /dev/mtd2\n"
-         "[slot NAND0.SYS.SPARE]\n"
-         "offset = 0x100000\n"
-         "size = 0x100000\n"
-         "node = /dev/mtd3\n"
-         "[device EMMC0]\n"
-         "technology = EMMC\n"
-         "base = 0\n"
-         "size = 0x1000000\n"
-         "[partition EMMC0.APP]\n"
-         "offset = 0\n"
-         "size = 0x1000000\n"
-         "node = /dev/mmca\n"
-         "[slot EMMC0.APP.STORE]\n"
-         "offset = 0x100000\n"
-         "size = 0x100000\n"
-         "node = /dev/mtd4\n"
-         "[device FS0]\n"
-         "technology = FILESYS\n"
-         "base = 0\n"
-         "size = 0x100000\n"
-         "[partition FS0.CFG]\n"
-         "size = 0x100000\n"
-         "[slot FS0.CFG.USER]\n"
-         "offset = 0\n"
-         "size = 0x1000\n"
-         "file = /data/user.cfg\n"
-         "[device SDRAM0]\n"
-         "technology = SDRAM\n"
-         "base = 0x30000000\n"
-         "size = 0x100000\n"
-         "[partition SDRAM0.RESV]\n"
-         "size = 0x100000\n"
-         "[slot SDRAM0.RESV.ARGS]\n"
-         "offset = 0x1010\n"
-         "size = 0x1000\n";
+// The test device's memory map (tests/data/flash-device.ini).
+inline std::string DeviceMap() {
+  std::ifstream file(STBPLAT_TEST_DATA_DIR "/flash-device.ini");
+  return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
 }
 
 // Writes text to a temporary file and removes it again.

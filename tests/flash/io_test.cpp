@@ -122,10 +122,16 @@ TEST_F(NorTest, WriteSplitsOnceAtTheFirstSectorBoundary) {
   std::vector<uint8_t> back(data.size());
   ASSERT_TRUE(flash.ReadFromNORFlashAtAddr(kNorBase + kNorSector - 16, back.data(), back.size()));
   EXPECT_EQ(back, data);
-  // Aligned: one write.
+  // Aligned, or ending on the boundary: one write.
   sim_.ClearHistory();
   ASSERT_TRUE(flash.WriteToNORFlashAtAddr(kNorBase + 0x40000, data.data(), 100));
-  EXPECT_EQ(sim_.Writes("/dev/mtd1").size(), 1u);
+  ASSERT_TRUE(flash.WriteToNORFlashAtAddr(kNorBase + 0x50000 - 16, data.data(), 16));
+  EXPECT_EQ(sim_.Writes("/dev/mtd1").size(), 2u);
+  // A failing first part ends the transfer.
+  sim_.ClearHistory();
+  sim_.FailCall(SimCall::kOpen, 1, EIO);
+  EXPECT_FALSE(flash.ReadFromNORFlashAtAddr(kNorBase + kNorSector - 16, back.data(), 32));
+  EXPECT_EQ(sim_.CallCount(SimCall::kOpen), 1);
 }
 
 TEST_F(NorTest, UnknownAddressFallsBackToTheWholeChip) {
@@ -161,6 +167,7 @@ TEST_F(NorTest, EraseRoundsUpAndReportsSuccessWhenTheKernelRefuses) {
   EXPECT_TRUE(flash.NORErase(kNorBase + 0x40000, kNorSector + 1));
   ASSERT_EQ(sim_.Erases("/dev/mtd1").size(), 1u);
   EXPECT_EQ(sim_.Erases("/dev/mtd1")[0], Span(0, 2 * kNorSector));
+  EXPECT_FALSE(log.Contains("Flash erase error"));
   // Unaligned start: the kernel refuses, the result is still true.
   EXPECT_TRUE(flash.NORErase(kNorBase + 0x40010, kNorSector));
   EXPECT_TRUE(log.Contains("Erase: Flash erase error in /dev/mtd1 \r\n"));
@@ -168,6 +175,10 @@ TEST_F(NorTest, EraseRoundsUpAndReportsSuccessWhenTheKernelRefuses) {
   EXPECT_TRUE(log.Contains("EraseSector: Flash erase error in /dev/mtd1 \r\n"));
   EXPECT_TRUE(EraseNOR(kNorBase, kNorSector));
   EXPECT_EQ(sim_.OpenCount(), 0);
+  // A sector size a caller set to 0 erases nothing rather than divide by it.
+  flash.norSectorSize = 0;
+  EXPECT_FALSE(flash.NORErase(kNorBase, kNorSector));
+  EXPECT_TRUE(log.Contains("Can't erase less than one flash sector, numBytes = 65536\r\n"));
 }
 
 TEST_F(NorTest, CEntryPointsForwardToTheSingleton) {
