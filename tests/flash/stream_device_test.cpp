@@ -42,57 +42,57 @@ void RoundTrip(const ComponentLocation& component) {
 
 using StreamDeviceTest = FlashTest;
 
-TEST_F(StreamDeviceTest, NorComponentGoesThroughTheFlashAddress) {
-  ComponentLocation component = Component("NOR0", "BOOT", "CONFIG", 0x20);
-  RoundTrip(component);
-  EXPECT_EQ(sim_.Bytes("/dev/mtd1", 0x20, 4), (std::vector<uint8_t>{'V', 'E', 'R', 'S'}));
-  EXPECT_EQ(sim_.OpenCount(), 0);
-}
-
-TEST_F(StreamDeviceTest, NandComponentSkipsBadBlocks) {
+// Each kind of place: the stream stores where the slot and offset say,
+// through the mode it opens in, and reads back what it stored.
+TEST_F(StreamDeviceTest, EveryKindOfPlaceStoresWhereItsSlotLies) {
+  struct Place {
+    const char* device;
+    const char* partition;
+    const char* slot;
+    unsigned long offset;
+    const char* node;  // null: physical memory
+    unsigned long at;  // where the bytes land in the node (or memory)
+  };
+  const Place places[] = {
+      {"NOR0", "BOOT", "CONFIG", 0x20, "/dev/mtd1", 0x20},
+      {"NAND0", "SYS", "DATA", 0, kNandData, kNandBlock},  // block 0 is bad
+      {"EMMC0", "APP", "STORE", 0x800, kEmmcNode, 0x100800},
+      {"FS0", "CFG", "USER", 4, "/data/user.cfg", 4},
+      {"SDRAM0", "RESV", "ARGS", 0x8, nullptr, kSdramBase + 0x1018},
+  };
   sim_.MarkBad(kNandData, 0);
-  ComponentLocation component = Component("NAND0", "SYS", "DATA", 0);
-  RoundTrip(component);
-  EXPECT_EQ(sim_.Bytes(kNandData, kNandBlock, 4), (std::vector<uint8_t>{'V', 'E', 'R', 'S'}));
-  Extruder in(&component, false);
-  EXPECT_TRUE(in.isNand);
-  EXPECT_EQ(in.partitionName, "NAND0.SYS.DATA");
-}
-
-TEST_F(StreamDeviceTest, EmmcComponentStartsAtTheSlotOffset) {
-  ComponentLocation component = Component("EMMC0", "APP", "STORE", 0x800);
-  RoundTrip(component);
-  EXPECT_EQ(sim_.Bytes(kEmmcNode, 0x100800, 4), (std::vector<uint8_t>{'V', 'E', 'R', 'S'}));
-  Extruder in(&component, false);
-  EXPECT_EQ(in.currNandOffset, 0x100800UL);
-}
-
-TEST_F(StreamDeviceTest, FileSlotIsCreatedWhenWritable) {
-  ComponentLocation component = Component("FS0", "CFG", "USER", 4);
-  {
-    Extruder reader(&component, false);
-    EXPECT_FALSE(reader.isInitedOK);
+  for (const Place& place : places) {
+    SCOPED_TRACE(place.device);
+    ComponentLocation component = Component(place.device, place.partition, place.slot, place.offset);
+    RoundTrip(component);
+    const uint8_t* memory = place.node == nullptr ? sim_.Memory(place.at) : nullptr;
+    std::vector<uint8_t> stored =
+        memory != nullptr ? std::vector<uint8_t>(memory, memory + 4) : sim_.Bytes(place.node, place.at, 4);
+    EXPECT_EQ(stored, (std::vector<uint8_t>{'V', 'E', 'R', 'S'}));
+    EXPECT_EQ(sim_.OpenCount(), 0);
   }
-  RoundTrip(component);
-  EXPECT_EQ(sim_.Bytes("/data/user.cfg", 4, 4), (std::vector<uint8_t>{'V', 'E', 'R', 'S'}));
-  EXPECT_EQ(sim_.OpenCount(), 0);
+  ComponentLocation store = Component("EMMC0", "APP", "STORE", 0x800);
+  Extruder emmc(&store, false);
+  EXPECT_EQ(emmc.currNandOffset, 0x100800UL);
+  ComponentLocation data = Component("NAND0", "SYS", "DATA", 0);
+  Extruder nand(&data, false);
+  EXPECT_TRUE(nand.isNand);
+  EXPECT_EQ(nand.partitionName, "NAND0.SYS.DATA");
 }
 
-TEST_F(StreamDeviceTest, SdramComponentIsMappedMemory) {
-  ComponentLocation component = Component("SDRAM0", "RESV", "ARGS", 0x8);
-  RoundTrip(component);
-  EXPECT_EQ(std::memcmp(sim_.Memory(kSdramBase + 0x1018), "VERS", 4), 0);
+TEST_F(StreamDeviceTest, FailuresToOpenSayWhy) {
+  // A file slot is created only by a writable stream.
+  ComponentLocation user = Component("FS0", "CFG", "USER", 4);
+  Extruder reader(&user, false);
+  EXPECT_FALSE(reader.isInitedOK);
+  ComponentLocation args = Component("SDRAM0", "RESV", "ARGS", 0x8);
   sim_.FailCall(SimCall::kMmap, 1, ENOMEM);
   LogCapture log;
-  Extruder in(&component, false);
-  EXPECT_FALSE(in.isInitedOK);
+  Extruder memory(&args, false);
+  EXPECT_FALSE(memory.isInitedOK);
   EXPECT_TRUE(log.Contains("mmap failed: errno = 12\r\n"));
-  EXPECT_EQ(in.memFd, 0);
+  EXPECT_EQ(memory.memFd, 0);
   EXPECT_EQ(sim_.OpenCount(), 0);
-}
-
-TEST_F(StreamDeviceTest, UnknownPlacesFailWithTheirMessages) {
-  LogCapture log;
   ComponentLocation noDevice = Component("XYZ", "A", "B", 0);
   Extruder a(&noDevice, false);
   EXPECT_FALSE(a.isInitedOK);
