@@ -4,20 +4,19 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
-#include <stdexcept>
 
 namespace stbplat {
 namespace test {
 
-ScratchDir::ScratchDir() {
-  std::string pattern = (std::filesystem::temp_directory_path() / "stbplat-tool-XXXXXX").string();
-  if (mkdtemp(&pattern[0]) == nullptr) throw std::runtime_error("mkdtemp failed");
-  path_ = pattern;
+namespace fs = std::filesystem;
+
+ScratchDir::ScratchDir() : path_((fs::temp_directory_path() / "stbplat-tool-XXXXXX").string()) {
+  if (mkdtemp(&path_[0]) == nullptr) throw fs::filesystem_error("mkdtemp", path_, std::error_code());
 }
 
 ScratchDir::~ScratchDir() {
   std::error_code ignored;
-  std::filesystem::remove_all(path_, ignored);
+  fs::remove_all(path_, ignored);
 }
 
 std::string ScratchDir::Write(const std::string& name, const std::string& contents) const {
@@ -25,15 +24,15 @@ std::string ScratchDir::Write(const std::string& name, const std::string& conten
 }
 
 std::string ScratchDir::Write(const std::string& name, const std::vector<unsigned char>& contents) const {
-  std::filesystem::path file = std::filesystem::path(path_) / name;
-  std::filesystem::create_directories(file.parent_path());
-  std::ofstream out(file, std::ios::binary | std::ios::trunc);
-  out.write(reinterpret_cast<const char*>(contents.data()), static_cast<std::streamsize>(contents.size()));
+  const fs::path file = fs::path(path_) / name;
+  fs::create_directories(file.parent_path());
+  std::ofstream(file, std::ios::binary).write(reinterpret_cast<const char*>(contents.data()),
+                                              static_cast<std::streamsize>(contents.size()));
   return file.string();
 }
 
 std::vector<unsigned char> ScratchDir::Read(const std::string& name) const {
-  std::ifstream in(std::filesystem::path(path_) / name, std::ios::binary);
+  std::ifstream in(fs::path(path_) / name, std::ios::binary);
   return std::vector<unsigned char>(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
 }
 

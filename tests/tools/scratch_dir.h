@@ -20,6 +20,7 @@ class ScratchDir {
   // Writes a file (creating its directories) and returns its path.
   std::string Write(const std::string& name, const std::string& contents) const;
   std::string Write(const std::string& name, const std::vector<unsigned char>& contents) const;
+  // A file's bytes; a name with a leading '/' is read where it is.
   std::vector<unsigned char> Read(const std::string& name) const;
 
  private:

@@ -15,8 +15,8 @@ struct ToolRun {
   std::string err;
 };
 
-// args are passed as they are (no shell); input, when given, is the
-// program's standard input. STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared.
+// args reach the program as they are; input is its standard input.
+// STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared.
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input = "");
 
 }  // namespace test
