@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# Builds the fuzz targets and runs each for a bounded time on seeds that the
-# library itself stores. Any crash, overread, leak, timeout or broken round
+# Builds the fuzz targets and runs each for a bounded time, seeded with the
+# golden records the unit tests read (tests/data, laid out by hand). Any crash, overread, leak, timeout or broken round
 # trip fails the run.
 #   run-fuzz.sh [SECONDS_PER_TARGET]   (default 20)
 set -euo pipefail
@@ -10,8 +10,17 @@ cmake --preset fuzz >/dev/null
 cmake --build --preset fuzz
 build=build/fuzz
 seeds=$build/seeds
-rm -rf "$seeds" && mkdir -p "$seeds"
-"$build/fuzz/fuzz_make_seeds" "$seeds"
+data=tests/data
+declare -A golden=(
+  [bseck_reload_fuzz]="bseck.bin" [build_config_fuzz]="build_config.bin" [code_object_info_fuzz]="coi.bin"
+  [data_entry_fuzz]="data.bin" [front_panel_fuzz]="afpd.bin" [fsbl_info_fuzz]="fsbl_info.bin"
+  [memory_config_fuzz]="mcfg_minor6.bin mcfg_minor5.bin"
+  [version_entry_fuzz]="vers_minor2.bin vers_no_tail.bin vers_to_pad.bin")
+rm -rf "$seeds"
+for target in "${!golden[@]}"; do
+  mkdir -p "$seeds/$target"
+  for file in ${golden[$target]}; do cp "$data/$file" "$seeds/$target/"; done
+done
 
 # A record on a NOR slot reads on past the slot without failing (the NOR read
 # reports nothing back), so a corrupt count of 65535 nested entries is read

@@ -105,6 +105,19 @@ BUILD_CONFIG = entry(
     b"KRNL" + b"\x00\x05" + b"\x00\x11" + b"c" + b"\0\0\0" + be("I", 0xDEADBEEF) + be("I", 4)
     + SEQC + UNKNOWN + PADD + BCFG)
 
+DATA = data(b"build 2026-11-22 aarch64\0")
+
+
+def component(tag, device, partition, slot, offset):
+    """tag | device, partition, slot (8 bytes each, '.'-padded) | offset (64 bits)"""
+    names = b"".join(name.ljust(8, b".") for name in (device, partition, slot))
+    return tag + names + be("Q", offset)
+
+
+COI = (be("H", 0) + component(b"PKGH", b"NOR0", b"BOOT", b"A", 0) + be("I", 2)
+       + component(b"KRNL", b"NAND0", b"KERNEL", b"A", 0x800)
+       + component(b"ROOT", b"NAND0", b"ROOTFS", b"A", 0x20000))
+
 FILES = {
     "vers_minor2.bin": VERS_FULL,
     "vers_no_tail.bin": VERS_NO_TAIL,
@@ -115,6 +128,8 @@ FILES = {
     "afpd.bin": AFPD,
     "fsbl_info.bin": FSBL_INFO,
     "build_config.bin": BUILD_CONFIG,
+    "data.bin": DATA,
+    "coi.bin": COI,
 }
 
 if __name__ == "__main__":
