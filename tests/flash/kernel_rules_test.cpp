@@ -45,6 +45,10 @@ class KernelRulesTest : public ::testing::Test {
     EXPECT_EQ(Sys().ioctl(fd_, ECCGETSTATS, &stats), 0);
     return stats;
   }
+  int MarkBad(uint64_t offset, int fd = -1) {
+    loff_t block = static_cast<loff_t>(offset);
+    return Sys().ioctl(fd < 0 ? fd_ : fd, MEMSETBADBLOCK, &block);
+  }
 
   FlashSim sim_;
   int fd_ = -1;
@@ -56,8 +60,7 @@ TEST_F(KernelRulesTest, ProgrammingClearsBitsAndIgnoresTheBadBlockTable) {
   EXPECT_EQ(sim_.Bytes(kNode, 0, kNandPage), std::vector<uint8_t>(kNandPage, 0x30));
 
   // Only erases consult the table; a write into a block marked bad lands.
-  loff_t block = 2 * kNandBlock;
-  ASSERT_EQ(Sys().ioctl(fd_, MEMSETBADBLOCK, &block), 0);
+  ASSERT_EQ(MarkBad(2 * kNandBlock), 0);
   std::vector<uint8_t> data = Pattern(kNandPage, 8);
   EXPECT_EQ(WriteAt(2 * kNandBlock + kNandPage, data), static_cast<long>(kNandPage));
   EXPECT_EQ(sim_.Bytes(kNode, 2 * kNandBlock + kNandPage, kNandPage), data);
@@ -130,32 +133,25 @@ TEST_F(KernelRulesTest, UnreadablePageCountsEveryEccStepAndReadsGarbage) {
   EXPECT_EQ(got, std::vector<uint8_t>(kNandPage, 0xFF));
 }
 
-TEST_F(KernelRulesTest, MarkingABadBlockAgainCountsAgain) {
+TEST_F(KernelRulesTest, MarkingBadErasesTheBlockAndCountsEveryMark) {
   sim_.MarkBad(kNode, 4 * kNandBlock);  // from the factory: counted once
   sim_.MarkBad(kNode, 4 * kNandBlock);
   EXPECT_EQ(Stats().badblocks, 1u);
-  loff_t block = 6 * kNandBlock;
-  ASSERT_EQ(Sys().ioctl(fd_, MEMSETBADBLOCK, &block), 0);
-  ASSERT_EQ(Sys().ioctl(fd_, MEMSETBADBLOCK, &block), 0);
+  ASSERT_EQ(WriteAt(6 * kNandBlock, std::vector<uint8_t>(kNandPage, 0x00)), static_cast<long>(kNandPage));
+  ASSERT_EQ(MarkBad(6 * kNandBlock), 0);
+  ASSERT_EQ(MarkBad(6 * kNandBlock), 0);
   EXPECT_EQ(Stats().badblocks, 3u);
+  EXPECT_EQ(sim_.Bytes(kNode, 6 * kNandBlock, kNandPage), std::vector<uint8_t>(kNandPage, 0xFF));
   errno = 0;
   EXPECT_EQ(Erase(6 * kNandBlock, kNandBlock), -1);
   EXPECT_EQ(errno, EIO);
-}
-
-TEST_F(KernelRulesTest, MarkingBadErasesTheBlockFirst) {
-  ASSERT_EQ(WriteAt(2 * kNandBlock, std::vector<uint8_t>(kNandPage, 0x00)), static_cast<long>(kNandPage));
-  loff_t block = 2 * kNandBlock;
-  ASSERT_EQ(Sys().ioctl(fd_, MEMSETBADBLOCK, &block), 0);
-  EXPECT_EQ(sim_.Bytes(kNode, 2 * kNandBlock, kNandPage), std::vector<uint8_t>(kNandPage, 0xFF));
 }
 
 TEST_F(KernelRulesTest, PartitionsOfAChipShareItsBytesAndBadBlocks) {
   sim_.AddPartition(6, "NAND0.SYS.LOW", kNode, 0, 4 * kNandBlock);
   sim_.AddPartition(7, "NAND0.SYS.HIGH", kNode, 4 * kNandBlock, 4 * kNandBlock);
   int high = Sys().open("/dev/mtd7", O_RDWR, 0);
-  loff_t block = kNandBlock;
-  ASSERT_EQ(Sys().ioctl(high, MEMSETBADBLOCK, &block), 0);
+  ASSERT_EQ(MarkBad(kNandBlock, high), 0);
   loff_t inChip = 5 * kNandBlock;
   EXPECT_EQ(Sys().ioctl(fd_, MEMGETBADBLOCK, &inChip), 1);
   ASSERT_EQ(WriteAt(4 * kNandBlock, std::vector<uint8_t>(kNandPage, 0x5A)), static_cast<long>(kNandPage));
