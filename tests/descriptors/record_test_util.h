@@ -1,8 +1,9 @@
-// Helpers for the record tests: golden files, written bytes, record
-// messages, and a memory stream that answers as a 64-bit device stream.
+// Helpers for the record tests: golden files, hand-made entries, written
+// bytes and the record messages.
 #ifndef STBPLAT_TESTS_DESCRIPTORS_RECORD_TEST_UTIL_H
 #define STBPLAT_TESTS_DESCRIPTORS_RECORD_TEST_UTIL_H
 
+#include <algorithm>
 #include <fstream>
 #include <iterator>
 #include <string>
@@ -17,6 +18,7 @@
 namespace records_test {
 
 using Bytes = std::vector<unsigned char>;
+using Texts = std::vector<std::string>;
 
 inline Bytes Golden(const std::string& name) {
   std::ifstream file(std::string(STBPLAT_TEST_DATA_DIR) + "/" + name, std::ios::binary);
@@ -27,64 +29,44 @@ inline Bytes Written(const Intruder& out) {
   return Bytes(out.pStart, out.pStart + (out.pCurrent - out.pStart));
 }
 
-// What `record` stores into a buffer of `size` bytes.
-template <class Record>
-Bytes Stored(const Record& record, size_t size) {
-  Bytes buffer(size);
-  Intruder out(buffer.data(), static_cast<unsigned int>(size));
-  EXPECT_EQ(record.StoreTLVAndData(&out), 0u);
-  return Written(out);
-}
-
-inline unsigned long Offset(const Extruder& in) {
-  return static_cast<unsigned long>(in.pCurrent - in.pStart);
-}
-
 // Texts of the record messages (module 3) only, in order.
-inline std::vector<std::string> RecordTexts(const stbplat::test::LogCapture& capture) {
-  std::vector<std::string> texts;
+inline Texts RecordTexts(const stbplat::test::LogCapture& capture) {
+  Texts texts;
   for (const auto& m : capture.messages())
     if (m.module == eLogModuleRecords) texts.push_back(m.text);
   return texts;
 }
 
-inline void Append(Bytes& bytes, const Bytes& more) {
-  bytes.insert(bytes.end(), more.begin(), more.end());
-}
+inline void Append(Bytes& bytes, const Bytes& more) { bytes.insert(bytes.end(), more.begin(), more.end()); }
 
 inline void PutU32(Bytes& bytes, unsigned int v) {
   for (int shift = 24; shift >= 0; shift -= 8) bytes.push_back(static_cast<unsigned char>(v >> shift));
 }
 
-inline void PutU16(Bytes& bytes, unsigned int v) {
-  bytes.push_back(static_cast<unsigned char>(v >> 8));
-  bytes.push_back(static_cast<unsigned char>(v));
-}
-
-inline void PutType(Bytes& bytes, const char* four) {
-  for (int i = 0; i < 4; ++i) bytes.push_back(static_cast<unsigned char>(four[i]));
-}
-
 // type | size | flags | major | minor | payload
-inline Bytes Entry(const char* type, const Bytes& payload, unsigned char major = 0,
-                   unsigned char minor = 0, unsigned short flags = 0) {
-  Bytes bytes;
-  PutType(bytes, type);
+inline Bytes Entry(const char* type, const Bytes& payload, unsigned char major = 0, unsigned char minor = 0,
+                   unsigned short flags = 0) {
+  Bytes bytes(type, type + 4);
   PutU32(bytes, static_cast<unsigned int>(4 + payload.size()));
-  PutU16(bytes, flags);
-  bytes.push_back(major);
-  bytes.push_back(minor);
+  Append(bytes, {static_cast<unsigned char>(flags >> 8), static_cast<unsigned char>(flags), major, minor});
   Append(bytes, payload);
   return bytes;
 }
 
 inline Bytes Data(const std::string& text) {
-  Bytes bytes;
-  PutType(bytes, "DATA");
+  Bytes bytes = {'D', 'A', 'T', 'A'};
   PutU32(bytes, static_cast<unsigned int>(text.size()));
   bytes.insert(bytes.end(), text.begin(), text.end());
   return bytes;
 }
+
+// A memory stream over bytes.
+struct In : Extruder {
+  explicit In(const Bytes& bytes, size_t keep = ~size_t{0})
+      : Extruder(bytes.data(), static_cast<unsigned int>(std::min(keep, bytes.size()))) {}
+  In(Bytes&&, size_t = 0) = delete;  // the stream would outlive its bytes
+  unsigned long Offset() const { return static_cast<unsigned long>(pCurrent - pStart); }
+};
 
 }  // namespace records_test
 
