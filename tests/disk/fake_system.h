@@ -11,7 +11,6 @@
 #include <memory>
 #include <set>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "os/seam.h"
@@ -58,8 +57,12 @@ struct FakeSystem {
 struct StopLoop {};
 
 // A real ATA disk's link and a USB disk's link.
-extern const char* const kAtaLink;
-extern const char* const kUsbLink;
+inline const char* const kAtaLink =
+    "../../devices/pci0000:00/0000:00:1f.2/ata1/host0/target0:0:0/0:0:0:0/block/sda";
+inline const char* const kUsbLink =
+    "../../devices/pci0000:00/0000:00:14.0/usb2/2-1/2-1:1.0/host6/target6:0:0/6:0:0:0/block/sdb";
+
+using Texts = std::vector<std::string>;
 
 }  // namespace test
 }  // namespace stbplat

@@ -51,19 +51,19 @@ TEST(StringChecks, BoundedSearchAllowedSetAndAddresses) {
     EXPECT_FALSE(StrSecurityCheck(bad, 1)) << static_cast<int>(static_cast<unsigned char>(*bad));
   EXPECT_TRUE(StrSecurityCheck("ab;", 2));
   EXPECT_TRUE(StrSecurityCheck("a\0b", 3));  // a 0 byte among the len bytes passes
+  EXPECT_FALSE(StrSecurityCheck(nullptr, 1));
   EXPECT_TRUE(IsValidIpAddress("192.168.1.10"));
   EXPECT_FALSE(IsValidIpAddress("192.168.1.256"));
   for (const char* net : {"255.255.255.0", "1.2.3.", "999.1.2.3", "..."})
     EXPECT_TRUE(IsValidSubNet(net)) << net;
   for (const char* net : {"1.2.3", "a.b.c.d", "1.2.3.4.5", "1.2.3.-4", ""})
     EXPECT_FALSE(IsValidSubNet(net)) << net;
-  EXPECT_TRUE(IsValidSubNet(std::string(259, '.').c_str()));  // the count is kept in 8 bits
 }
 
 TEST(SubsystemInit, ZanForwardsToThePlatformHWSpecificLogsATrace) {
   EXPECT_EQ(ZanSubSystemInit(), 71);
   LogCapture capture;
-  HWSpecificInit();
+  EXPECT_EQ(HWSpecificInit(), 0);
   EXPECT_EQ(capture.texts(), std::vector<std::string>{"HW Specific Init\n"});
   const stbplat::test::LogMessage& m = capture.messages().at(0);
   EXPECT_EQ(m.module, 11);
