@@ -16,7 +16,7 @@ using stbplat::test::LogCapture;
 
 const unsigned char* U(const char* s) { return reinterpret_cast<const unsigned char*>(s); }
 
-std::string Payload(const DataEntry& e) { return std::string(reinterpret_cast<const char*>(e.GetData()), e.length); }
+std::string Payload(const DataEntry& e) { return Text(e.GetData(), e.length); }
 
 TEST(DataEntryRead, OwnedBorrowedAndEmptyPayloads) {
   Bytes bytes = Data("payload");
@@ -104,11 +104,8 @@ TEST(DataEntryInPlace, FileSourceIsReachedThroughTheStream) {
   Bytes bytes = {0xEE};
   Append(bytes, Data("Z"));
   bytes.push_back(0xEE);
-  char path[] = "/tmp/stbplat_data_entry_XXXXXX";
-  FILE* file = fdopen(mkstemp(path), "wb");
-  fwrite(bytes.data(), 1, bytes.size(), file);
-  fclose(file);
-  Extruder in(path, true);
+  const std::string path = FileWith(bytes);
+  Extruder in(path.c_str(), true);
   in += 1;
   DataEntry e;
   ASSERT_EQ(e.ReadTLVAndData(in, nullptr, true), 0u);
@@ -130,54 +127,40 @@ TEST(DataEntryInPlace, FileSourceIsReachedThroughTheStream) {
   e.length = 3;  // past the file's end: not read at all
   e.DisplayAsText();
   EXPECT_EQ(capture.texts(), (Texts{"Z\r\n", "[none]\r\n"}));
-  std::remove(path);
+  std::remove(path.c_str());
 }
 
-TEST(DataEntry, ALengthWithoutPayloadStoresTheHeaderCopiesZerosAndShowsNone) {
+TEST(DataEntry, PayloadlessEntriesDisplayAndComparison) {
   DataEntry header;
-  header.length = 3;
+  header.length = 3;  // a length without a payload
   unsigned char buffer[16];
   Intruder out(buffer, sizeof buffer);
   EXPECT_EQ(header.StoreTLVAndData(&out), 0u);
   EXPECT_EQ(Written(out), (Bytes{'D', 'A', 'T', 'A', 0, 0, 0, 3}));
-  DataEntry copy(header);
-  EXPECT_EQ(Payload(copy), std::string(3, '\0'));
-  DataEntry empty;
-  DataEntry emptyCopy(empty);
-  EXPECT_EQ(emptyCopy.GetData(), nullptr);
+  EXPECT_EQ(Payload(DataEntry(header)), std::string(3, '\0'));
+  EXPECT_EQ(DataEntry(DataEntry()).GetData(), nullptr);
   LogCapture capture;
   header.DisplayAsText();
-  EXPECT_EQ(capture.texts(), Texts{"[none]\r\n"});
-}
-
-TEST(DataEntry, DisplayWithAndWithoutTerminator) {
-  const struct {
-    Bytes payload;
-    const char* shown;
-  } cases[] = {{{'A', 'B', 'C', 'D', 'E'}, "ABCDE\r\n"}, {{'A', 'B', 0, 'C'}, "AB\r\n"}, {{0, 'x'}, " \r\n"}};
-  for (const auto& c : cases) {
+  const Bytes payloads[] = {{'A', 'B', 'C', 'D', 'E'}, {'A', 'B', 0, 'C'}, {0, 'x'}};
+  for (const Bytes& payload : payloads) {
     DataEntry e;
-    e.CreateData(static_cast<unsigned int>(c.payload.size()), c.payload.data());
-    LogCapture capture;
+    e.CreateData(static_cast<unsigned int>(payload.size()), payload.data());
     e.DisplayAsText();
-    ASSERT_EQ(capture.texts(), Texts{c.shown});
-    EXPECT_EQ(capture.messages()[0].level, 4u);
-    EXPECT_EQ(Bytes(e.GetData(), e.GetData() + e.length), c.payload) << "left as it was";
+    EXPECT_EQ(Bytes(e.GetData(), e.GetData() + e.length), payload) << "left as it was";
   }
-}
-
-TEST(DataEntry, ComparesNullsLengthsAndBytes) {
+  EXPECT_EQ(capture.texts(), (Texts{"[none]\r\n", "ABCDE\r\n", "AB\r\n", " \r\n"}));
+  EXPECT_EQ(capture.messages()[0].level, 4u);
   DataEntry a;
   DataEntry b;
-  DataEntry c;
   EXPECT_TRUE(a == b);
   a.CreateData(2, U("ab"));
   EXPECT_FALSE(b == a);
   b.CreateData(3, U("abc"));
   EXPECT_FALSE(a == b);
-  c.CreateData(2);
-  EXPECT_EQ(Payload(c), std::string(2, '\0'));
-  EXPECT_FALSE(a == c);
+  DataEntry zeros;
+  zeros.CreateData(2);
+  EXPECT_EQ(Payload(zeros), std::string(2, '\0'));
+  EXPECT_FALSE(a == zeros);
   EXPECT_TRUE(a == DataEntry(a));
 }
 

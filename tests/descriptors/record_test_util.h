@@ -4,6 +4,8 @@
 #define STBPLAT_TESTS_DESCRIPTORS_RECORD_TEST_UTIL_H
 
 #include <algorithm>
+#include <cstdio>
+#include <cstdlib>
 #include <fstream>
 #include <iterator>
 #include <string>
@@ -24,6 +26,8 @@ inline Bytes Golden(const std::string& name) {
   std::ifstream file(std::string(STBPLAT_TEST_DATA_DIR) + "/" + name, std::ios::binary);
   return Bytes(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
 }
+
+inline std::string Text(const unsigned char* p, size_t n) { return std::string(p, p + n); }
 
 inline Bytes Written(const Intruder& out) {
   return Bytes(out.pStart, out.pStart + (out.pCurrent - out.pStart));
@@ -58,6 +62,15 @@ inline Bytes Data(const std::string& text) {
   PutU32(bytes, static_cast<unsigned int>(text.size()));
   bytes.insert(bytes.end(), text.begin(), text.end());
   return bytes;
+}
+
+// A temporary file holding bytes; the caller removes it.
+inline std::string FileWith(const Bytes& bytes) {
+  char path[] = "/tmp/stbplat-record-XXXXXX";
+  FILE* file = fdopen(mkstemp(path), "wb");
+  fwrite(bytes.data(), 1, bytes.size(), file);
+  fclose(file);
+  return path;
 }
 
 // A memory stream over bytes.

@@ -1,16 +1,20 @@
-// The records against hand-made golden bytes: field by field, stored back
-// byte for byte, optional trailing fields, old layouts, partial lists, and the
-// containers' dispatch on nested entry types.
+// The records against hand-made golden bytes, stored back byte for byte;
+// optional trailing fields, old layouts, partial lists, the containers'
+// dispatch on nested entry types; and every record cut short at each byte, its
+// statuses and messages.
 #include <gtest/gtest.h>
 
 #include <cstdio>
 #include <cstdlib>
+#include <algorithm>
 #include <string>
 #include <tuple>
+#include <type_traits>
 
 #include "record_test_util.h"
 #include "stbplat/bseck_reload.h"
 #include "stbplat/build_config.h"
+#include "stbplat/code_object_info.h"
 #include "stbplat/front_panel.h"
 #include "stbplat/fsbl_info.h"
 #include "stbplat/memory_config.h"
@@ -20,8 +24,6 @@ namespace {
 
 using namespace records_test;
 using stbplat::test::LogCapture;
-
-std::string Text(const unsigned char* p, size_t n) { return std::string(reinterpret_cast<const char*>(p), n); }
 
 // Reads `record` from all of `bytes`, which it must take whole.
 template <class R>
@@ -47,6 +49,47 @@ Bytes RoundTrip(const Bytes& golden) {
   return Stored(record);
 }
 
+// A package header with two components, all names and offsets zero.
+Bytes PackageHeader() {
+  Bytes bytes(2 + 36 + 4 + 2 * 36, 0);
+  bytes[2 + 36 + 3] = 2;
+  return bytes;
+}
+
+template <class R>
+unsigned int ReadRecord(R& record, Extruder& in) {
+  if constexpr (std::is_base_of_v<SystemDescriptor, R>)
+    return record.ReadTLVAndData(in, nullptr);
+  else
+    return record.Read(in);
+}
+
+// The status of reading a record of class R from the first `cut` bytes.
+template <class R>
+unsigned int ReadCut(const Bytes& bytes, size_t cut) {
+  In in(bytes, cut);
+  R record;
+  return ReadRecord(record, in);
+}
+
+// The status of storing the record read from `bytes` (its payload, or the
+// whole entry when framed) into a buffer of `cut` bytes.
+template <class R, bool framed = false>
+unsigned int StoreCut(const Bytes& bytes, size_t cut) {
+  In in(bytes);
+  R record;
+  EXPECT_EQ(ReadRecord(record, in), 0u);
+  Bytes buffer(cut + 1);
+  Intruder out(buffer.data(), static_cast<unsigned int>(cut));
+  if constexpr (framed) return record.StoreTLVAndData(&out);
+  return record.Store(&out);
+}
+
+Bytes Patched(Bytes bytes, size_t at, unsigned char value) {
+  bytes[at] = value;
+  return bytes;
+}
+
 Bytes Fsbl(unsigned int count, const Bytes& nested) {
   Bytes payload = Golden("vers_no_tail.bin");
   PutU32(payload, count);
@@ -61,7 +104,7 @@ Bytes Skipped(const char* type, unsigned int size) {
   return bytes;
 }
 
-TEST(Records, GoldenRecordsStoreBackByteForByteAndFreshOnesStoreTheirDefaults) {
+TEST(Records, GoldenRecordsStoreBackByteForByteAndFreshOnesTheirDefaults) {
   const Bytes build = Golden("build_config.bin");
   const struct {
     Bytes (*roundTrip)(const Bytes&);
@@ -83,17 +126,18 @@ TEST(Records, GoldenRecordsStoreBackByteForByteAndFreshOnesStoreTheirDefaults) {
   EXPECT_EQ(Stored(MemoryConfigDescriptor()), Entry("MCFG", {0, 0}, 0, 6));
   EXPECT_EQ(Stored(MemoryControllerDescriptor()), Entry("MCET", Bytes(14, 0), 0, 6));
   EXPECT_EQ(Stored(MemoryControllerSegmentDescriptor()), Entry("MCSD", Bytes(12, 0), 0, 6));
-}
-
-TEST(VersionEntry, GoldenRecordFieldByField) {
-  VersionEntry v;
-  ReadWhole(v, Golden("vers_minor2.bin"));
-  EXPECT_EQ(v.flags, 0x8001);
-  EXPECT_EQ(std::tie(v.majorVersion, v.minorVersion, v._temp), std::make_tuple(3, 14, 0x0102));
-  EXPECT_EQ(Text(v.description.GetData(), v.description.length), std::string("Release 3.14", 13));
-  EXPECT_EQ(v.versionLetter, 'b');
-  EXPECT_EQ(Text(v.sequenceControl.controlledSequenceName, 9), std::string("MAINLINE", 9));
-  EXPECT_EQ(v.sequenceControl.otpEpoch, 0x40000002u);
+  const BuildConfig config;
+  EXPECT_EQ(std::tie(config.componentVerLetter, config.unused1, config.numDescriptors),
+            std::make_tuple(0, 0u, 0u));
+  EXPECT_EQ(Text(config.componentTag, 4), std::string(4, '\0'));
+  EXPECT_EQ(BuildEnvironmentDescriptor().flags, 0);
+  // The read-only records store nothing.
+  Intruder out(64u, 0u);
+  EXPECT_EQ(FSBLInfo().Store(&out), 0xA00Au);
+  EXPECT_EQ(DeviceConfigDescriptor().Store(&out), 0xA00Au);
+  EXPECT_EQ(config.Store(&out), 0xA00Au);
+  EXPECT_EQ(BuildEnvironmentDescriptor().Store(&out), 0xA00Au);
+  EXPECT_EQ(out.pCurrent, out.pStart);
 }
 
 TEST(VersionEntry, OptionalTrailingFieldsFollowTheEntrySize) {
@@ -123,22 +167,14 @@ TEST(VersionEntry, OptionalTrailingFieldsFollowTheEntrySize) {
     PutU32(expected, 0);
     EXPECT_EQ(Stored(v), expected) << name;
   }
-  const Bytes foreign = Entry("VERS", {0, 1, 0, 2, 0, 3, 'X', 'X', 'X', 'X', 0, 0, 0, 0});
-  In in(foreign);
-  VersionEntry v;
-  EXPECT_EQ(v.ReadTLVAndData(in, nullptr), 0xA004u) << "a description of another type";
-  EXPECT_FALSE(v.valid);
 }
 
 TEST(BseckReload, GoldenRecordPartialListsAndEquality) {
   const Bytes golden = Golden("bseck.bin");
   BseckReloadDescriptor d;
   ReadWhole(d, golden);
-  EXPECT_EQ(d.ExecutingType, 2);
   ASSERT_EQ(d.ReloadErrors.size(), 3u);
   const BseckReloadError first = d.ReloadErrors[0];
-  EXPECT_EQ(std::tie(first.flags, first.majorVer, first.minorVer, first.Type, first.Error),
-            std::make_tuple(1, 1, 2, 0x10, 0xE001));
   EXPECT_EQ(d.ReloadErrors[2].majorVer, 9) << "elements carry no version check";
   In cut(golden, golden.size() - 5);  // inside the third element
   EXPECT_EQ(d.ReadTLVAndData(cut, nullptr), 0xA012u);
@@ -147,8 +183,6 @@ TEST(BseckReload, GoldenRecordPartialListsAndEquality) {
   In in(huge);
   EXPECT_EQ(d.ReadTLVAndData(in, nullptr), 0xA012u);
   EXPECT_EQ(d.ReloadErrors.size(), 1u) << "a count beyond the stream stops at its end";
-  ReadWhole(d, Entry("BSCK", {0, 7, 0, 0}));
-  EXPECT_TRUE(d.ReloadErrors.empty());
   BseckReloadError a = first;
   a.flags = 7;
   a.majorVer = 8;
@@ -168,8 +202,6 @@ TEST(MemoryConfig, GoldenLayoutsOldSizesInMiBStoredInTheCurrentOne) {
   EXPECT_EQ(std::tie(c.ddrCfgWidth, c.ddrSize, c.ddrSpeed, c.ddrDevTech, c.ddrMode, c.ddrDevWidth),
             std::make_tuple(32, 2048, 1600, 4, 1, 16));
   EXPECT_EQ(c.memorySegments.at(1).segmentPhysicalAddressStart, 0x100000000ul);
-  EXPECT_EQ(c.memorySegments.at(1).segmentSize, 1024u);
-  EXPECT_EQ(config.memoryControllers.at(1).memorySegments.size(), 1u);
   MemoryConfigDescriptor old;
   ReadWhole(old, Golden("mcfg_minor5.bin"));
   const MemoryControllerDescriptor& o = old.memoryControllers.at(0);
@@ -185,8 +217,7 @@ TEST(MemoryConfig, GoldenLayoutsOldSizesInMiBStoredInTheCurrentOne) {
   EXPECT_EQ(many.at(13), 0);
 }
 
-TEST(MemoryConfig, FailingElementsAndCountsBeyondTheStream) {
-  // A failing segment is dropped and earlier ones stay; a failing controller stays.
+TEST(MemoryConfig, AFailingControllerStaysAndAFailingSegmentGoes) {
   Bytes controller = Golden("mcfg_minor6.bin");
   controller = Bytes(controller.begin() + 14, controller.begin() + 14 + 8 + 0x42);
   Bytes payload = {2, 0};
@@ -197,7 +228,6 @@ TEST(MemoryConfig, FailingElementsAndCountsBeyondTheStream) {
   MemoryConfigDescriptor config;
   EXPECT_EQ(config.ReadTLVAndData(in, nullptr), 0xA004u);
   EXPECT_EQ(config.memoryControllers.size(), 2u);
-  EXPECT_EQ(in.bytesLeft, 0u);
   controller[25] = 3;  // three segments, two present
   In in2(controller);
   MemoryControllerDescriptor c;
@@ -205,109 +235,169 @@ TEST(MemoryConfig, FailingElementsAndCountsBeyondTheStream) {
   EXPECT_EQ(c.ReadTLVAndData(in2, nullptr), 0xA012u);
   EXPECT_EQ(c.memorySegments.size(), 2u);
   EXPECT_FALSE(c.valid);
-  Bytes old = Golden("mcfg_minor5.bin");
-  old[0x1E] = old[0x1F] = 0xFF;  // a huge segment count
-  In in3(old);
-  EXPECT_EQ(config.ReadTLVAndData(in3, nullptr), 0xA012u);
-  EXPECT_EQ(config.memoryControllers.at(0).memorySegments.size(), 2u);
 }
 
-TEST(FSBLInfo, GoldenRecordDispatchesEveryMember) {
+TEST(Containers, DispatchOnNestedTypesAndSkipPaddingAndUnknownEntries) {
   FSBLInfo info;
+  BuildConfig config;
   LogCapture capture;
   ReadWhole(info, Golden("fsbl_info.bin"));
-  EXPECT_EQ(info.versionEntry.sequenceControl.nvSequence, 7u);
   EXPECT_EQ(std::tie(info.deviceConfig.scbClock, info.deviceConfig.avsEnabled), std::make_tuple(432, 1));
   EXPECT_EQ(info.memConfig.memoryControllers.size(), 2u);
   EXPECT_EQ(info.BseckInfo.ReloadErrors.size(), 3u);
-  // Padding is silent; the unknown entry has exactly one message.
+  ReadWhole(config, Golden("build_config.bin"));
+  EXPECT_EQ(std::tie(config.unused1, config.sequenceControl.sequenceControl.nvSequence),
+            std::make_tuple(0xDEADBEEFu, 42u));
+  EXPECT_EQ(Text(config.buildEnvironment.text.GetData(), 12), std::string("gcc 12; -O2", 12));
+  EXPECT_TRUE(config.buildEnvironment.text.ownsData);
+  // Padding is silent; an unknown entry has one message in FSBL information only.
   EXPECT_EQ(RecordTexts(capture), Texts{"Unknown entry type 0x58545241 in FSBL info\r\n"});
-}
-
-TEST(FSBLInfo, PaddingThatEndsAFileIsSkipped) {
+  // Padding that ends a file is skipped too.
   Bytes nested = Entry("DEVC", {0, 5, 1, 0});
   Append(nested, Skipped("PADD", 4));
   const Bytes bytes = Fsbl(2, nested);
-  char path[] = "/tmp/stbplat_fsbl_XXXXXX";
-  FILE* file = fdopen(mkstemp(path), "wb");
-  fwrite(bytes.data(), 1, bytes.size(), file);
-  fclose(file);
-  Extruder in(path, true);
-  FSBLInfo info;
+  const std::string path = FileWith(bytes);
+  Extruder in(path.c_str(), true);
   EXPECT_EQ(info.ReadTLVAndData(in, nullptr), 0u);
   EXPECT_EQ(info.deviceConfig.scbClock, 5);
-  std::remove(path);
+  std::remove(path.c_str());
 }
 
-TEST(FSBLInfo, CountsNestedFailuresAndSkipsTheStreamCannotHold) {
-  Bytes devc = Entry("DEVC", {0, 5, 1, 0}, 1);  // major 1: newer than the member accepts
+TEST(Containers, StopAtTheFirstFailingOrMissingEntry) {
+  const Bytes devc = Entry("DEVC", {0, 5, 1, 0}, 1);  // major 1: newer than the member accepts
+  const Bytes build = Golden("build_config.bin");
   const struct {
+    unsigned int (*read)(const Bytes&, size_t);
     Bytes bytes;
     unsigned int status;
   } cases[] = {
-      {Fsbl(0, devc), 0},  // present but not counted
-      {Fsbl(1, devc), 0xA004},
-      {Fsbl(1, Entry("MCFG", {})), 0xA004},
-      {Fsbl(1, Entry("BSCK", {})), 0xA004},
-      {Fsbl(0xFFFFFFFF, Skipped("PADD", 4)), 0xA012},
-      {Fsbl(2, Skipped("PADD", 0x7F000000)), 0xA012},
-      {Fsbl(2, Skipped("ZZZZ", 0xFFFFFFFF)), 0xA012},
+      {ReadCut<VersionEntry>, Entry("VERS", {0, 1, 0, 2, 0, 3, 'X', 'X', 'X', 'X', 0, 0, 0, 0}), 0xA004},
+      {ReadCut<FSBLInfo>, Fsbl(0, devc), 0},  // present but not counted
+      {ReadCut<FSBLInfo>, Fsbl(1, devc), 0xA004},
+      {ReadCut<FSBLInfo>, Fsbl(1, Entry("MCFG", {})), 0xA004},
+      {ReadCut<FSBLInfo>, Fsbl(1, Entry("BSCK", {})), 0xA004},
+      {ReadCut<FSBLInfo>, Fsbl(0xFFFFFFFF, Skipped("PADD", 4)), 0xA012},
+      {ReadCut<FSBLInfo>, Fsbl(2, Skipped("PADD", 0x7F000000)), 0xA012},
+      {ReadCut<FSBLInfo>, Fsbl(2, Skipped("ZZZZ", 0xFFFFFFFF)), 0xA012},
+      {ReadCut<BuildConfig>, Patched(build, 42, 9), 0xA004},  // the members' major versions
+      {ReadCut<BuildConfig>, Patched(build, 116, 9), 0xA004},
+      {ReadCut<BuildConfig>, Patched(build, 28, 0xFF), 0xA012},  // the count
+      {ReadCut<BuildConfig>, Patched(build, 76, 0x7F), 0xA012},  // an unknown entry's size
+      {ReadCut<BuildEnvironmentDescriptor>, Entry("BCFG", Entry("VERS", {})), 0xA004},  // the text's status
+      {ReadCut<MemoryConfigDescriptor>, Patched(Golden("mcfg_minor5.bin"), 0x1E, 0xFF), 0xA012},
+  };
+  for (const auto& c : cases) EXPECT_EQ(c.read(c.bytes, c.bytes.size()), c.status) << &c - cases;
+}
+
+std::string R(const char* field) { return std::string("Error reading ") + field + "\r\n"; }
+std::string W(const char* field) { return std::string("Error writing ") + field + "\r\n"; }
+
+// The record cut short at every byte from `from` to `to` in turn: its
+// statuses, each change once, and every message, each text once, in the
+// order they first come.
+struct Sweep {
+  std::vector<unsigned int> statuses;
+  Texts messages;
+};
+
+Sweep CutEverywhere(unsigned int (*cut)(const Bytes&, size_t), const Bytes& bytes, size_t from, size_t to) {
+  Sweep sweep;
+  for (size_t n = from; n <= to; ++n) {
+    LogCapture capture;
+    const unsigned int status = cut(bytes, n);
+    if (sweep.statuses.empty() || sweep.statuses.back() != status) sweep.statuses.push_back(status);
+    for (const std::string& text : RecordTexts(capture))
+      if (std::find(sweep.messages.begin(), sweep.messages.end(), text) == sweep.messages.end())
+        sweep.messages.push_back(text);
+  }
+  return sweep;
+}
+
+TEST(RecordMessages, StreamsAndBuffersEndingInsideEachField) {
+  const Bytes vers = Golden("vers_minor2.bin");
+  const Bytes bsck = Golden("bseck.bin");
+  const Bytes mcfg = Golden("mcfg_minor6.bin");
+  const Bytes old = Golden("mcfg_minor5.bin");
+  const Bytes bldc = Golden("build_config.bin");
+  const Bytes afpd = Golden("afpd.bin");
+  const Bytes devc = Entry("DEVC", {0, 5, 1, 0});
+  const Bytes pkg = PackageHeader();
+  Bytes fsbl = Golden("vers_no_tail.bin");
+  PutU32(fsbl, 5);
+  Append(fsbl, devc);
+  Append(fsbl, {'P', 'A', 'D', 'D', 0, 0, 0, 0, 'Z', 'Z', 'Z', 'Z', 0, 0, 0, 0});
+  Append(fsbl, Entry("MCFG", {0, 0}));
+  Append(fsbl, Entry("BSCK", {0, 0, 0, 0}));
+  fsbl = Entry("FSBL", fsbl);
+  const char* const seq = "(uint8_t *)controlledSequenceName";
+  const std::string mcet = "Insufficient memory to add entry of type MCET\r\n";
+  const std::string pkgHeader = "packageHeaderLocation";
+  const struct {
+    unsigned int (*cut)(const Bytes&, size_t);
+    const Bytes& bytes;
+    size_t from, to;  // 0: the record's length
+    std::vector<unsigned int> statuses;
+    Texts messages;
+  } cases[] = {
+      {ReadCut<VersionEntry>, vers, 0, 0, {0xA012, 0},
+       {R("storedEntryType"), R("entrySize"), R("localFlags"), R("localMajorVer"), R("minorVer"),
+        R("majorVersion"), R("minorVersion"), R("_temp"), R("entryType"), R("description"),
+        R("versionLetter"), R("pad"), R(seq), R("sequenceControl"), R("otpEpoch"), R("nvSequence")}},
+      {ReadCut<BseckReloadDescriptor>, bsck, 12, 0, {0xA012, 0},
+       {R("ExecutingType"), R("numReloadError"), R("flags"), R("ReloadErrors"), R("majorVer"), R("minorVer"),
+        R("Type"), R("Error")}},
+      {ReadCut<DeviceConfigDescriptor>, devc, 12, 0, {0xA012, 0},
+       {R("scbClock"), R("avsEnabled"), R("reserved")}},
+      {ReadCut<MemoryConfigDescriptor>, mcfg, 12, 64, {0xA012},
+       {R("numControllers"), R("reserved"), R("storedEntryType"), R("memoryControllers"), R("entrySize"),
+        R("localFlags"), R("localMajorVer"), R("minorVer"), R("ddrCfgWidth"), R("ddrSize"), R("ddrSpeed"),
+        R("ddrDevTech"), R("ddrMode"), R("ddrDevWidth"), R("numSegments"), R("memorySegments"),
+        R("segmentPhysicalAddressStart"), R("segmentSize")}},
+      {ReadCut<MemoryConfigDescriptor>, old, 26, 33, {0xA012},
+       {R("memoryControllerNumber"), R("memoryControllers"), R("numSegments")}},
+      {ReadCut<FSBLInfo>, fsbl, 12, 0, {0xA012, 0},
+       {R("storedEntryType"), R("versionEntry"), R("entrySize"), R("localFlags"), R("localMajorVer"),
+        R("minorVer"), R("majorVersion"), R("minorVersion"), R("_temp"), R("entryType"), R("description"),
+        R("numDescriptors"), R("deviceConfig"), R("scbClock"), R("avsEnabled"), R("reserved"),
+        "Unknown entry type 0x5A5A5A5A in FSBL info\r\n", R("memConfig"), R("numControllers"), R("BseckInfo"),
+        R("ExecutingType"), R("numReloadError")}},
+      {ReadCut<BuildConfig>, bldc, 12, 0, {0xA012, 0},
+       {R("componentTag"), R("(uint8_t *)componentMajorVer"), R("(uint8_t *)componentMinorVer"),
+        R("componentVerLetter"), R("reserved"), R("unused1"), R("numDescriptors"), R("entrySize"),
+        R("sequenceControl"), R("localFlags"), R("localMajorVer"), R("minorVer"), R(seq),
+        R("otpEpoch"), R("nvSequence"), R("buildEnvironment"), R("entryType")}},
+      {ReadCut<AnimatedFrontPanelDisplayEntry>, afpd, 12, 0, {0xA012, 0},
+       {R("entryType"), R("text"), R("entrySize")}},
+      {ReadCut<CodeObjectInfo>, pkg, 0, 0, {0xA012, 0xA004, 0xA012, 0xA004, 0},
+       {R("unused"), R("componentTag"), R(pkgHeader.c_str()), R("deviceName"), R("(*pLocationStorage)"),
+        R("partitionName"), R("slotName"), R("slotOffset"), R("numComponents"), R("componentLocations[i]")}},
+      {StoreCut<VersionEntry, true>, vers, 0, 11, {0xA012},
+       {W("entryType"), "Insufficient memory to add entry of type VERS\r\n", W("flags"), W("majorVer"),
+        W("minorVer")}},
+      // The sequence-control block's failure is not looked at.
+      {StoreCut<VersionEntry>, vers, 0, 57, {0xA012, 0xA004, 0xA012, 0},
+       {W("majorVersion"), W("minorVersion"), W("_temp"), W("DATA_ENTRY_TYPE"), W("description"), W("length"),
+        W("pPayload"), W("versionLetter"), W("pad"), W(seq), W("otpEpoch"), W("nvSequence")}},
+      {StoreCut<BseckReloadDescriptor>, bsck, 0, 28, {0xA012, 0xA004, 0},
+       {W("ExecutingType"), W("numReloadError"), W("flags"), W("ReloadErrors"), W("majorVer"), W("minorVer"),
+        W("Type"), W("Error")}},
+      {StoreCut<MemoryConfigDescriptor>, mcfg, 0, 52, {0xA012, 0xA004},
+       {W("numControllers"), W("reserved"), W("entryType"), W("memoryControllers"), mcet, W("flags"),
+        W("majorVer"), W("minorVer"), W("ddrCfgWidth"), W("ddrSize"), W("ddrSpeed"), W("ddrDevTech"),
+        W("ddrMode"), W("ddrDevWidth"), W("numSegments"), W("memorySegments"),
+        "Insufficient memory to add entry of type MCSD\r\n", W("segmentPhysicalAddressStart"),
+        W("segmentSize")}},
+      {StoreCut<AnimatedFrontPanelDisplayEntry>, afpd, 0, 14, {0xA004, 0},
+       {W("DATA_ENTRY_TYPE"), W("text"), W("length"), W("pPayload")}},
+      {StoreCut<CodeObjectInfo>, pkg, 0, 114, {0xA012, 0xA004, 0xA012, 0xA004, 0},
+       {W("unused"), W("componentTag"), W(pkgHeader.c_str()), W("deviceName"), W("partitionName"),
+        W("slotName"), W("slotOffset"), W("numComponents"), W("componentLocations[i]")}},
   };
   for (const auto& c : cases) {
-    In in(c.bytes);
-    FSBLInfo info;
-    EXPECT_EQ(info.ReadTLVAndData(in, nullptr), c.status) << &c - cases;
-    EXPECT_EQ(info.versionEntry.majorVersion, 1) << &c - cases;
-    EXPECT_EQ(info.deviceConfig.scbClock, 0) << &c - cases;
+    const Sweep sweep = CutEverywhere(c.cut, c.bytes, c.from, c.to != 0 ? c.to : c.bytes.size());
+    EXPECT_EQ(sweep.statuses, c.statuses) << c.messages.at(0);
+    EXPECT_EQ(sweep.messages, c.messages) << c.messages.at(0);
   }
-}
-
-TEST(BuildConfig, GoldenRecordSkipsUnknownAndPaddingEntriesSilently) {
-  BuildConfig config;
-  LogCapture capture;
-  ReadWhole(config, Golden("build_config.bin"));
-  EXPECT_EQ(Text(config.componentTag, 4), "KRNL");
-  EXPECT_EQ(Text(config.componentMajorVer, 2) + Text(config.componentMinorVer, 2), std::string("\0\5\0\21", 4));
-  EXPECT_EQ(std::tie(config.componentVerLetter, config.unused1, config.numDescriptors),
-            std::make_tuple('c', 0xDEADBEEFu, 4u));
-  EXPECT_EQ(config.sequenceControl.sequenceControl.nvSequence, 42u);
-  EXPECT_EQ(Text(config.buildEnvironment.text.GetData(), 12), std::string("gcc 12; -O2", 12));
-  EXPECT_TRUE(config.buildEnvironment.text.ownsData);
-  EXPECT_TRUE(RecordTexts(capture).empty());
-}
-
-TEST(BuildConfig, NestedFailuresAndCountsBeyondTheStream) {
-  const Bytes golden = Golden("build_config.bin");
-  const struct {
-    size_t at;
-    unsigned char value;
-    unsigned int status;
-  } cases[] = {{42, 9, 0xA004}, {116, 9, 0xA004}, {28, 0xFF, 0xA012}, {76, 0x7F, 0xA012}};
-  for (const auto& c : cases) {
-    Bytes bytes = golden;
-    bytes[c.at] = c.value;  // a member's major version, the count, an unknown entry's size
-    In in(bytes);
-    BuildConfig config;
-    EXPECT_EQ(config.ReadTLVAndData(in, nullptr), c.status) << c.at;
-  }
-  const Bytes text = Entry("BCFG", Entry("VERS", {}));
-  In in(text);
-  EXPECT_EQ(BuildEnvironmentDescriptor().ReadTLVAndData(in, nullptr), 0xA004u) << "the text's own status";
-}
-
-TEST(ReadOnlyRecords, StoreIsNotSupportedAndFreshOnesAreEmpty) {
-  unsigned char buffer[64];
-  Intruder out(buffer, sizeof buffer);
-  EXPECT_EQ(FSBLInfo().Store(&out), 0xA00Au);
-  EXPECT_EQ(DeviceConfigDescriptor().Store(&out), 0xA00Au);
-  EXPECT_EQ(BuildConfig().Store(&out), 0xA00Au);
-  EXPECT_EQ(BuildEnvironmentDescriptor().Store(&out), 0xA00Au);
-  EXPECT_EQ(out.pCurrent, buffer);
-  const BuildConfig config;
-  EXPECT_EQ(config.entryType, 0x424C4443u);
-  EXPECT_EQ(std::tie(config.componentVerLetter, config.unused1, config.numDescriptors), std::make_tuple(0, 0u, 0u));
-  EXPECT_EQ(Text(config.componentTag, 4), std::string(4, '\0'));
-  EXPECT_EQ(BuildEnvironmentDescriptor().flags, 0);
 }
 
 }  // namespace

@@ -15,7 +15,7 @@ namespace {
 
 const unsigned char kCheck[] = {'1', '2', '3', '4', '5', '6', '7', '8', '9'};
 
-TEST(Crc, CheckValuesEmptyDataAndSplits) {
+TEST(Crc, CheckValuesEmptyDataSplitsAndTheRing) {
   EXPECT_EQ(ComputeCRC16(kCheck, sizeof kCheck), 0x2189);
   EXPECT_EQ(ComputeCRC32(kCheck, sizeof kCheck), 0xCBF43926u);
   EXPECT_EQ(ComputeCRC32(kCheck, 0), 0u);
@@ -24,9 +24,7 @@ TEST(Crc, CheckValuesEmptyDataAndSplits) {
   EXPECT_EQ(CRC32EnetFinal(CRC32Enet(CRC32Enet(0xFFFFFFFFu, kCheck, 4), kCheck + 4, 5)), 0xCBF43926u);
   const unsigned short first = CalcCRC16(kCheck, 5, 0, false, nullptr, nullptr);
   EXPECT_EQ(CalcCRC16(kCheck + 5, 4, first, false, nullptr, nullptr), 0x2189);
-}
-
-TEST(Crc, Crc16WrapsAfterTheRingEndOnlyWhenAsked) {
+  // CRC-16 wraps after the ring's end, only when asked.
   const unsigned char ring[] = {'A', 'B', 'C', 'D'};
   const unsigned char flat[] = {'B', 'C', 'A'};
   EXPECT_EQ(CalcCRC16(ring + 1, 3, 0, true, ring, ring + 2), ComputeCRC16(flat, 3));

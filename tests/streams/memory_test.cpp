@@ -32,24 +32,17 @@ T Take(Extruder& in, unsigned int rc = 0) {
   return value;
 }
 
-TEST(MemoryStreams, EveryWidthGoesOutAndComesBackBigEndian) {
-  unsigned char buffer[22] = {};
+TEST(MemoryStreams, SignedValuesAndBoolsGoOutAndComeBackBigEndian) {
+  unsigned char buffer[8] = {};
   Intruder out(buffer, sizeof buffer);
-  EXPECT_EQ(out.intrude(static_cast<unsigned short>(0x1234)), 1u);
   EXPECT_EQ(out.intrude(static_cast<short>(-2)), 1u);
-  EXPECT_EQ(out.intrude(0x01020304u), 1u);
-  EXPECT_EQ(out.intrude(0x1122334455667788ul), 1u);
   EXPECT_EQ(out.intrude(static_cast<unsigned char>(0xAB)), 1u);
   EXPECT_EQ(out.intrude(true), 1u);
   EXPECT_EQ(out.intrude(-0x01020305), 2u) << "exactly full";
-  EXPECT_EQ(Written(out), (Bytes{0x12, 0x34, 0xFF, 0xFE, 1, 2, 3, 4, 0x11, 0x22, 0x33,
-                                 0x44, 0x55, 0x66, 0x77, 0x88, 0xAB, 1, 0xFE, 0xFD, 0xFC, 0xFB}));
-  buffer[17] = 0x02;  // a bool byte other than 1
-  Extruder in(buffer, sizeof buffer);
-  EXPECT_EQ(Take<unsigned short>(in), 0x1234);
+  EXPECT_EQ(Written(out), (Bytes{0xFF, 0xFE, 0xAB, 1, 0xFE, 0xFD, 0xFC, 0xFB}));
+  buffer[3] = 0x02;  // a bool byte other than 1
+  Extruder in(buffer, 8);
   EXPECT_EQ(Take<short>(in), -2);
-  EXPECT_EQ(Take<unsigned int>(in), 0x01020304u);
-  EXPECT_EQ(Take<unsigned long>(in), 0x1122334455667788ul);
   in += 1;
   bool flag = false;
   EXPECT_EQ(in.extrude(&flag), 0u);
@@ -130,10 +123,7 @@ TEST(MemoryStreams, SetPMovesUpToTheEndOnlyAndSetLengthKeepsTheDifference) {
   Extruder in(storage, 6);
   EXPECT_TRUE(in.setP(storage + 6));
   EXPECT_EQ(in.bytesLeft, 0u);
-  EXPECT_TRUE(in.setP(storage + 1));
-  ++in;
-  ++in;
-  --in;
+  EXPECT_TRUE(in.setP(storage + 2));
   LogCapture log;
   EXPECT_FALSE(in.setP(storage + 7));
   EXPECT_EQ(in.getP(), storage + 2);
