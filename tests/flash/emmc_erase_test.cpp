@@ -37,6 +37,16 @@ TEST_F(EmmcTest, WriteChunksStopAtTheChunkBoundaryRoundedToPages) {
   ASSERT_TRUE(flash.EMMCRead(back.data(), back.size(), "ANY.NAME.AT", 0x70000));
   EXPECT_EQ(back, big);
   EXPECT_EQ(sim_.OpenCount(), 0);
+  // Without a page size a chunk ends on the chunk boundary; without a chunk
+  // size the write is one chunk.
+  flash.nandPageSize = 0;
+  sim_.ClearHistory();
+  ASSERT_TRUE(flash.EMMCWrite(big.data(), 0x80000, kStoreSlot, 1));
+  EXPECT_EQ(sim_.Writes(kEmmcNode), (std::vector<Span>{Span(1, 0x7FFFF), Span(0x80000, 1)}));
+  flash.emmcChunkSize = 0;
+  sim_.ClearHistory();
+  ASSERT_TRUE(flash.EMMCWrite(big.data(), 0x90000, kStoreSlot, 1));
+  EXPECT_EQ(sim_.Writes(kEmmcNode), (std::vector<Span>{Span(1, 0x90000)}));
 }
 
 TEST_F(EmmcTest, FailingChunkIsRetriedUntilItGoesThrough) {
@@ -115,9 +125,20 @@ TEST_F(EraseTest, NorSlotErasesWholeSectorsOnly) {
   Location none = MakeLocation("NOR0", "BOOT", "NONE");
   EXPECT_FALSE(flash.EraseSlot(&none));
   EXPECT_TRUE(log.Contains("FlashInterface::EraseSlot: Location NOR0.BOOT.NONE not found\r\n"));
+  log.Clear();
+  EXPECT_FALSE(flash.EraseSector(&none));
+  EXPECT_TRUE(log.Contains("FlashInterface::EraseSlot: Location NOR0.BOOT.NONE not found\r\n"));
   Location nodevice = MakeLocation("XYZ", "A", "B");
   EXPECT_FALSE(flash.EraseSlot(&nodevice));
   EXPECT_TRUE(log.Contains("Device XYZ.A.B not found\r\n"));
+  Location noNode = MakeLocation("NAND0", "SYS", "NONE");
+  EXPECT_FALSE(flash.EraseSlot(&noNode));
+  EXPECT_TRUE(log.Contains("FlashInterface::EraseSlot: unable to find mtd partition for NAND0.SYS.NONE\n"));
+  // Without a sector size a NOR slot erase erases nothing.
+  flash.norSectorSize = 0;
+  sim_.ClearHistory();
+  EXPECT_TRUE(flash.EraseSlot(&config));
+  EXPECT_EQ(sim_.CallCount(SimCall::kMemErase), 0);
 }
 
 TEST_F(EraseTest, ReadOnlyNorSlotReadsAndRefusesWrites) {
@@ -183,6 +204,8 @@ TEST_F(EraseTest, NandSectorErasesBlockZeroOnly) {
   LogCapture log;
   EXPECT_FALSE(flash.EraseNANDSector("/dev/none"));
   EXPECT_TRUE(log.Contains("EraseNANDSector: open of mtd partition /dev/none failed\n"));
+  EXPECT_FALSE(flash.EraseNANDSlot("/dev/none"));
+  EXPECT_TRUE(log.Contains("EraseNANDSlot: open of mtd partition /dev/none failed\n"));
 }
 
 TEST_F(EraseTest, EmmcSlotIsRefusedBySlotEraseAndSkippedBySectorErase) {

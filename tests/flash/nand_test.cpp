@@ -114,6 +114,19 @@ TEST_F(NandTest, FailedWriteMovesEarlierDataToTheNextGoodBlock) {
   EXPECT_EQ(sim_.OpenCount(), 0);
 }
 
+TEST_F(NandTest, UnreadableEarlierDataEndsTheWrite) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(2 * kNandPage, 3);
+  ASSERT_TRUE(flash.NANDWrite(data.data(), data.size(), kDataSlot, 0));
+  sim_.FailWritesAt(kNandData, 2 * kNandPage);
+  sim_.FailCall(SimCall::kRead, 1, EIO);
+  LogCapture log;
+  EXPECT_FALSE(flash.NANDWrite(data.data(), data.size(), kDataSlot, 2 * kNandPage));
+  EXPECT_TRUE(log.Contains(
+      "HandleBadNANDBlock: unable to read bad block at offset 0x00000000, size = 0x00001000\r\n"));
+  EXPECT_FALSE(sim_.IsBad(kNandData, 0));
+}
+
 TEST_F(NandTest, FailureAtBlockStartMarksWithoutMoving) {
   FlashInterface& flash = Flash();
   std::vector<uint8_t> data = Pattern(kNandPage, 4);

@@ -119,6 +119,11 @@ TEST_F(PartitionTableTest, NorOpenFailureIsReportedAndDefaultKept) {
       "FlashInterface::FlashInterface: can't open /dev/mtd8, unable to get NOR sector size\r\n"));
 }
 
+TEST_F(PartitionTableTest, NorEraseSizeOfZeroKeepsTheDefault) {
+  sim_.AddMtd(8, "flash0", SimKind::kNor, 0x400000, 0);
+  EXPECT_EQ(Flash().norSectorSize, 0x20000UL);
+}
+
 TEST_F(PartitionTableTest, NandDescriptorZeroCountsAsNotOpened) {
   sim_.SetFirstDescriptor(0);
   // The NOR measurement takes descriptor 0 and gives it back; the NAND one
@@ -144,6 +149,9 @@ TEST_F(PartitionTableTest, LookupByNameSearchesEveryRowAndLeavesOffset) {
   // Rows past mtdCount are searched too.
   std::strcpy(flash.mtdNames[29], "LATE.ROW.X");
   EXPECT_STREQ(flash.LookupMTDPartition("LATE.ROW.X", &offset), "/dev/mtd29");
+  // Alias names count only up to aliasCount (0).
+  std::strcpy(flash.aliasNames[0], "LATE");
+  EXPECT_EQ(flash.LookupMTDPartition("LATE.ROW.Y", &offset), nullptr);
 }
 
 TEST_F(PartitionTableTest, UpgradeModeResolvesSlotsToWholeDevices) {
@@ -180,6 +188,8 @@ TEST_F(PartitionTableTest, AddressLookupUsesTheMemoryMapThenTheTableWalk) {
   // Below the chip nothing matches; the walk stops at the first NAND row.
   EXPECT_EQ(flash.LookupMTDPartition(kNorBase - 1, &offset), nullptr);
   EXPECT_EQ(flash.LookupMTDPartition(kNorBase + 0x100000, &offset), nullptr);
+  flash.mtdCount = 0;  // rows past the count are not walked
+  EXPECT_EQ(flash.LookupMTDPartition(kNorBase + 0x30004, &offset), nullptr);
 }
 
 TEST_F(PartitionTableTest, AddressLookupBeforeTheMapIsLoadedIsFixed) {
@@ -188,6 +198,7 @@ TEST_F(PartitionTableTest, AddressLookupBeforeTheMapIsLoadedIsFixed) {
   unsigned long offset = 0;
   EXPECT_STREQ(flash.LookupMTDPartition(kNorBase + 0x40010, &offset), "/dev/mtd8");
   EXPECT_EQ(offset, 0x40010UL);
+  EXPECT_EQ(flash.GetNORChipSize(), 0UL);
 }
 
 }  // namespace
