@@ -6,19 +6,12 @@
 #if __has_include("stbplat/flash_interface.h")
 
 #include <cerrno>
-#include <cstdio>
-#include <cstdlib>
-#include <fstream>
-#include <string>
 
 #include "harness.h"
 #include "stbplat/component_location.h"
-#include "stbplat/data_entry.h"
-#include "stbplat/extruder.h"
 #include "stbplat/flash_c.h"
 #include "stbplat/flash_interface.h"
 #include "stbplat/intruder.h"
-#include "stbplat/location.h"
 #include "stbplat/version_entry.h"
 
 using namespace systest;
@@ -58,14 +51,10 @@ bool PutOnEmmc(unsigned long at, const Bytes& bytes) {
                                                    std::to_string(at / kPage) + " conv=fsync 2>/dev/null") == 0;
 }
 
-bool FlashErase(const std::string& node) { return Shell("flash_erase -q " + node + " 0 0") == 0; }
-
 // busybox devmem on a 32-bit word: its answer when reading, nothing when
 // writing a value.
 std::string DevMem(unsigned long address, const std::string& value = "") {
-  std::string out = ShellOutput("devmem " + std::to_string(address) + " 32 " + value);
-  while (!out.empty() && (out.back() == '\n' || out.back() == '\r')) out.pop_back();
-  return out;
+  return ShellOutput("devmem " + std::to_string(address) + " 32 " + value);
 }
 
 // Whether /proc/iomem lists the physical address as System RAM.
@@ -94,13 +83,10 @@ SCENARIO("flash.table") {
     std::string node = "/dev/mtd" + std::to_string(n);
     CHECK_EQ(std::string(flash->mtdNames[n]), kBoxNames[n]);
     CHECK_EQ(Lookup(kBoxNames[n], 77), node + " 77");
-    // BOOT.A's node is read-only and the eMMC's a disk: neither gives a size.
+    // The kernel's sizes, but BOOT.A's node is read-only and the eMMC's a
+    // disk: neither gives one.
     CHECK_EQ(flash->GetDevSize(node.c_str()), n == 0 || n == 14 ? 0 : flash->mtdSizes[n]);
   }
-  // Sizes as the kernel reports them.
-  CHECK_EQ(flash->mtdSizes[0], kNorPart);
-  CHECK_EQ(flash->mtdSizes[8], kNorChip);
-  CHECK_EQ(flash->mtdSizes[11], 64 * kBlock);
   CHECK_EQ(flash->mtdSizes[14], 64ul << 20);
   CHECK_EQ(flash->GetDevSize("/dev/mtd29"), 0ul);
   CHECK_LOG("GetDevSize: Failed to obtain file handle for /dev/mtd29\r\n");
@@ -128,7 +114,7 @@ SCENARIO("flash.table") {
 SCENARIO("flash.nand_slot") {
   // KERNEL.A: 16 blocks, block 2 bad from the factory, passed over.
   MtdDevice dev("/dev/mtd9");
-  REQUIRE(dev.ok() && dev.EraseAllGood());
+  REQUIRE(FlashErase("/dev/mtd9"));
   const unsigned long length = 5 * kBlock + 7 * kPage;
   auto data = Pattern(length, 10);
   CHECK(NANDWrite(data.data(), length, "NAND0.KERNEL.A", 0));
@@ -154,7 +140,7 @@ SCENARIO("flash.nand_slot") {
 
 SCENARIO("flash.nand_partial_page") {
   MtdDevice dev("/dev/mtd9");
-  REQUIRE(dev.ok() && dev.EraseAllGood());
+  REQUIRE(FlashErase("/dev/mtd9"));
   FlashInterface* flash = Flash();
   auto data = Pattern(3100, 11);
   // 100 bytes: only buffered. The next 3000 complete page 0 and leave 1052
@@ -184,7 +170,7 @@ SCENARIO("flash.mtd_utils") {
   MtdDevice dev("/dev/mtd10");  // KERNEL.B, block 4 bad
   const unsigned long length = 10 * kBlock;
   auto data = Pattern(length, 12), other = Pattern(length, 13);
-  REQUIRE(dev.ok() && FlashErase("/dev/mtd10"));
+  REQUIRE(FlashErase("/dev/mtd10"));
   CHECK(NANDWrite(data.data(), length, "NAND0.KERNEL.B", 0));
   CHECK_EQ(Shell("nanddump -q --bb=skipbad -f /tmp/kb.dump /dev/mtd10"), 0);
   CHECK_EQ(ReadFile("/tmp/kb.dump"), data + Erased(5 * kBlock));
@@ -210,7 +196,7 @@ SCENARIO("flash.mtd_utils") {
 
 SCENARIO("flash.erase_weak_block") {
   MtdDevice dev("/dev/mtd12");
-  REQUIRE(dev.ok() && dev.IsBad(6 * kBlock) == 0);
+  REQUIRE(dev.IsBad(6 * kBlock) == 0);
   CHECK(Flash()->EraseNANDSlot("/dev/mtd12"));
   CHECK_LOG("Flash erase error @ 0x000C0000\n");
   CHECK_LOG("NANDErase: marking block at offset 0x000C0000 as bad\n");
@@ -220,7 +206,7 @@ SCENARIO("flash.erase_weak_block") {
 
 SCENARIO("flash.weak_page_relocation") {
   MtdDevice dev("/dev/mtd12");
-  REQUIRE(dev.ok() && dev.IsBad(2 * kBlock) == 0);
+  REQUIRE(dev.IsBad(2 * kBlock) == 0);
   REQUIRE(dev.Erase(2 * kBlock, kBlock) == 0 && dev.Erase(3 * kBlock, kBlock) == 0);
   FlashInterface* flash = Flash();
   const unsigned long start = dev.LogicalOf(2);
@@ -242,7 +228,7 @@ SCENARIO("flash.weak_page_relocation") {
 
 SCENARIO("flash.grave_page") {
   MtdDevice dev("/dev/mtd12");
-  REQUIRE(dev.ok() && dev.IsBad(8 * kBlock) == 0 && dev.IsBad(9 * kBlock) == 0);
+  REQUIRE(dev.IsBad(8 * kBlock) == 0 && dev.IsBad(9 * kBlock) == 0);
   // nandsim only fails reads of pages that hold data.
   REQUIRE(dev.Erase(8 * kBlock, kBlock) == 0);
   REQUIRE(dev.Write(8 * kBlock + 10 * kPage, Pattern(kPage, 20)) == static_cast<long>(kPage));
@@ -257,7 +243,7 @@ SCENARIO("flash.grave_page") {
 
 SCENARIO("flash.nor") {
   MtdDevice chip("/dev/mtd8");
-  REQUIRE(chip.ok() && chip.Erase(0, kNorChip) == 0);
+  REQUIRE(chip.Erase(0, kNorChip) == 0);
   FlashInterface* flash = Flash();
   // CFG.A (mtd2) starts 1 MiB into the chip. 16 bytes before a sector
   // boundary, three sectors long: a 16-byte write and one write of the
@@ -291,9 +277,9 @@ SCENARIO("flash.nor") {
 SCENARIO("flash.nor_read_only") {
   // BOOT.A (mtd0) is read-only, as the boot loader's partition is on the
   // box: records and bytes read there; every write is refused by the kernel.
-  MtdDevice chip("/dev/mtd8"), boot("/dev/mtd0");
-  CHECK_EQ(boot.ok() ? 0 : errno, EACCES);
-  REQUIRE(chip.ok() && chip.Erase(0, kNorPart) == 0);
+  MtdDevice chip("/dev/mtd8");
+  CHECK_EQ(::open("/dev/mtd0", O_RDWR) < 0 ? errno : 0, EACCES);
+  REQUIRE(chip.Erase(0, kNorPart) == 0);
   VersionEntry version, back;
   version.majorVersion = 3;
   version.description.CreateData(6, U("boot.1"));
@@ -353,7 +339,6 @@ SCENARIO("flash.emmc") {
 // only; timings are never asserted.
 SCENARIO("flash.timing") {
   MtdDevice dev("/dev/mtd11");  // ROOTFS.A, 64 blocks, block 8 bad
-  REQUIRE(dev.ok());
   const unsigned long length = (64 - dev.Blocks().size()) * kBlock;
   auto data = Pattern(length, 19);
   Bytes back(length);
@@ -365,7 +350,6 @@ SCENARIO("flash.timing") {
   double toolWrite = Seconds([&] { CHECK_EQ(Shell("nandwrite -q -p /dev/mtd11 /tmp/rootfs.in"), 0); });
   std::string dump = "nanddump -q --bb=skipbad -l " + std::to_string(length) + " -f /tmp/rootfs.out /dev/mtd11";
   double toolRead = Seconds([&] { CHECK_EQ(Shell(dump), 0); });
-  CHECK_EQ(ReadFile("/tmp/rootfs.out"), data);
   char line[256];
   std::snprintf(line, sizeof line,
                 "timing %lu bytes: NANDWrite %.3fs / nandwrite %.3fs = %.2f; "
@@ -379,7 +363,7 @@ SCENARIO("flash.erase_slots") {
   // NOR: SPLASH.A, 2 MiB into the chip, and SPLASH.B after it; EraseSector
   // clears the first sector of its slot only.
   MtdDevice chip("/dev/mtd8"), kernelB("/dev/mtd10");
-  REQUIRE(chip.ok() && kernelB.ok() && chip.Erase(0x200000, 2 * kNorPart) == 0);
+  REQUIRE(chip.Erase(0x200000, 2 * kNorPart) == 0);
   auto data = Pattern(2 * kNorPart, 21);
   REQUIRE(chip.Write(0x200000, data) == static_cast<long>(data.size()));
   Location splashA = Loc("NOR0", "SPLASH", "A"), splashB = Loc("NOR0", "SPLASH", "B");
@@ -411,7 +395,7 @@ SCENARIO("streams.nand_record") {
   // KERNEL.A: block 2 is bad. The record starts one page into block 1 and
   // its payload runs on through block 3.
   MtdDevice dev("/dev/mtd9");
-  REQUIRE(dev.ok() && dev.EraseAllGood());
+  REQUIRE(FlashErase("/dev/mtd9"));
   const unsigned int start = kBlock + kPage, payloadSize = kBlock + 3000;
   auto payload = Pattern(payloadSize, 30);
   // The constructor drops its offset argument by design; set it after.

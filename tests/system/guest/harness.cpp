@@ -1,17 +1,8 @@
 #include "harness.h"
 
-#include <sys/wait.h>
-
-#include <algorithm>
-#include <chrono>
 #include <cstdarg>
-#include <cstdio>
-#include <cstdlib>
 #include <cstring>
-#include <fstream>
-#include <iterator>
 #include <map>
-#include <random>
 
 #include "stbplat/log.h"
 
@@ -84,103 +75,6 @@ bool LogContains(const std::string& text) {
 
 void ClearLog() { LogStore().clear(); }
 
-int Shell(const std::string& command) {
-  std::fflush(stdout);
-  int status = std::system(command.c_str());
-  return status == -1 || !WIFEXITED(status) ? -1 : WEXITSTATUS(status);
-}
-
-std::string ShellOutput(const std::string& command) {
-  std::string out;
-  FILE* pipe = popen(command.c_str(), "r");
-  for (int c; pipe != nullptr && (c = std::fgetc(pipe)) != EOF;) out += static_cast<char>(c);
-  if (pipe != nullptr) pclose(pipe);
-  return out;
-}
-
-std::string CaptureStdout(const std::function<void()>& fn) {
-  const char* path = "/tmp/systest-stdout";
-  std::fflush(stdout);
-  int saved = ::dup(1), fd = ::open(path, O_WRONLY | O_CREAT | O_TRUNC, 0644);
-  ::dup2(fd, 1);
-  ::close(fd);
-  fn();
-  std::fflush(stdout);
-  ::dup2(saved, 1);
-  ::close(saved);
-  auto bytes = ReadFile(path);
-  std::string text(bytes.begin(), bytes.end());
-  std::printf("%s", text.c_str());  // keep it in the console log too
-  return text;
-}
-
-double Seconds(const std::function<void()>& step) {
-  auto start = std::chrono::steady_clock::now();
-  step();
-  return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
-}
-
-Bytes Pattern(std::size_t size, unsigned int seed) {
-  std::minstd_rand generator(seed + 1);
-  Bytes data(size);
-  for (auto& b : data) b = static_cast<unsigned char>(generator() >> 8);
-  return data;
-}
-
-Bytes Slice(const Bytes& data, std::size_t from, std::size_t length) {
-  return Bytes(data.begin() + from, data.begin() + from + length);
-}
-
-Bytes ReadFile(const std::string& path) {
-  std::ifstream in(path, std::ios::binary);
-  return Bytes(std::istreambuf_iterator<char>(in), {});
-}
-
-bool WriteFile(const std::string& path, const Bytes& data) {
-  std::ofstream out(path, std::ios::binary);
-  out.write(reinterpret_cast<const char*>(data.data()), static_cast<std::streamsize>(data.size()));
-  return static_cast<bool>(out);
-}
-
-std::string Pair(const Bytes& a, const Bytes& b) {
-  auto first = std::mismatch(a.begin(), a.end(), b.begin(), b.end()).first - a.begin();
-  return "sizes " + std::to_string(a.size()) + " and " + std::to_string(b.size()) + ", first difference at " +
-         std::to_string(first);
-}
-
-Bytes MtdDevice::ReadAll(std::uint64_t at, std::size_t length) {
-  Bytes data(length);
-  if (Read(at, data) != static_cast<long>(length)) data.clear();
-  return data;
-}
-
-std::vector<std::uint64_t> MtdDevice::Blocks(bool bad) {
-  std::vector<std::uint64_t> blocks;
-  for (std::uint64_t at = 0; at < info_.size; at += info_.erasesize)
-    if ((IsBad(at) > 0) == bad) blocks.push_back(at / info_.erasesize);
-  return blocks;
-}
-
-bool MtdDevice::EraseAllGood() {
-  bool all = true;
-  for (auto block : Blocks(false)) all = Erase(block * info_.erasesize, info_.erasesize) == 0 && all;
-  return all;
-}
-
-Bytes MtdDevice::GoodBlocks() {
-  Bytes all;
-  for (auto block : Blocks(false)) {
-    Bytes one = ReadAll(block * info_.erasesize, info_.erasesize);
-    all.insert(all.end(), one.begin(), one.end());
-  }
-  return all;
-}
-
-std::uint64_t MtdDevice::LogicalOf(std::uint64_t block) {
-  auto good = Blocks(false);
-  return std::count_if(good.begin(), good.end(), [&](std::uint64_t b) { return b < block; }) * info_.erasesize;
-}
-
 }  // namespace systest
 
 int main(int argc, char** argv) {
@@ -188,9 +82,10 @@ int main(int argc, char** argv) {
     std::fprintf(stderr, "usage: %s <scenario> | --list\n", argv[0]);
     return 2;
   }
-  for (const auto& entry : Registry())
-    if (std::strcmp(argv[1], "--list") == 0) std::printf("%s\n", entry.first.c_str());
-  if (std::strcmp(argv[1], "--list") == 0) return 0;
+  if (std::strcmp(argv[1], "--list") == 0) {
+    for (const auto& entry : Registry()) std::printf("%s\n", entry.first.c_str());
+    return 0;
+  }
   const char* path = std::getenv("STBPLAT_SYSTEST_RESULTS");
   FILE* file = path != nullptr ? std::fopen(path, "a") : nullptr;
   if (file != nullptr) results = file;
@@ -198,6 +93,7 @@ int main(int argc, char** argv) {
   auto it = Registry().find(argv[1]);
   if (it == Registry().end()) first_failure = "no such scenario";
   if (it != Registry().end()) it->second();
-  Report(first_failure.empty() ? "PASS " + std::string(argv[1]) : "FAIL " + std::string(argv[1]) + ": " + first_failure);
+  std::string name = argv[1];
+  Report(first_failure.empty() ? "PASS " + name : "FAIL " + name + ": " + first_failure);
   return first_failure.empty() ? 0 : 1;
 }

@@ -11,10 +11,19 @@
 #include <fcntl.h>
 #include <mtd/mtd-abi.h>
 #include <sys/ioctl.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <chrono>
+#include <cctype>
 #include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
 #include <functional>
+#include <iterator>
+#include <random>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -44,24 +53,74 @@ void Info(const std::string& text);
 bool LogContains(const std::string& text);
 void ClearLog();
 
-// Runs a shell command, returns its exit status (-1 when it could not run),
-// or what it printed.
-int Shell(const std::string& command);
-std::string ShellOutput(const std::string& command);
-// What fn printed on file descriptor 1 (child processes included).
-std::string CaptureStdout(const std::function<void()>& fn);
-// How long a step takes, in seconds.
-double Seconds(const std::function<void()>& step);
-
-Bytes Pattern(std::size_t size, unsigned int seed);
-Bytes Slice(const Bytes& data, std::size_t from, std::size_t length);
-inline Bytes Erased(std::size_t size) { return Bytes(size, 0xFF); }
-inline Bytes operator+(Bytes a, const Bytes& b) {
-  a.insert(a.end(), b.begin(), b.end());
-  return a;
+// Runs a shell command, returns its exit status (-1 when it could not run).
+inline int Shell(const std::string& command) {
+  std::fflush(stdout);
+  int status = std::system(command.c_str());
+  return status == -1 || !WIFEXITED(status) ? -1 : WEXITSTATUS(status);
 }
-Bytes ReadFile(const std::string& path);
-bool WriteFile(const std::string& path, const Bytes& data);
+
+// Erases a flash partition with mtd-utils (which pass bad blocks over).
+inline bool FlashErase(const std::string& node) { return Shell("flash_erase -q " + node + " 0 0") == 0; }
+
+inline Bytes ReadFile(const std::string& path) {
+  std::ifstream in(path, std::ios::binary);
+  return Bytes(std::istreambuf_iterator<char>(in), {});
+}
+
+inline bool WriteFile(const std::string& path, const Bytes& data) {
+  std::ofstream out(path, std::ios::binary);
+  out.write(reinterpret_cast<const char*>(data.data()), static_cast<std::streamsize>(data.size()));
+  return static_cast<bool>(out);
+}
+
+// What fn printed on file descriptor 1 (child processes included).
+inline std::string CaptureStdout(const std::function<void()>& fn) {
+  std::fflush(stdout);
+  int saved = ::dup(1), fd = ::open("/tmp/systest-stdout", O_WRONLY | O_CREAT | O_TRUNC, 0644);
+  ::dup2(fd, 1);
+  ::close(fd);
+  fn();
+  std::fflush(stdout);
+  ::dup2(saved, 1);
+  ::close(saved);
+  Bytes text = ReadFile("/tmp/systest-stdout");
+  std::fwrite(text.data(), 1, text.size(), stdout);  // keep it in the console log too
+  return std::string(text.begin(), text.end());
+}
+
+// What a shell command printed, less trailing white space.
+inline std::string ShellOutput(const std::string& command) {
+  std::string out = CaptureStdout([&] { Shell(command); });
+  while (!out.empty() && std::isspace(static_cast<unsigned char>(out.back()))) out.pop_back();
+  return out;
+}
+
+// How long a step takes, in seconds.
+inline double Seconds(const std::function<void()>& step) {
+  auto start = std::chrono::steady_clock::now();
+  step();
+  return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+}
+
+inline Bytes Pattern(std::size_t size, unsigned int seed) {
+  std::minstd_rand generator(seed + 1);
+  Bytes data(size);
+  for (auto& b : data) b = static_cast<unsigned char>(generator() >> 8);
+  return data;
+}
+
+inline Bytes Slice(const Bytes& data, std::size_t from, std::size_t length) {
+  return Bytes(data.begin() + from, data.begin() + from + length);
+}
+
+inline Bytes Erased(std::size_t size) { return Bytes(size, 0xFF); }
+
+inline Bytes operator+(const Bytes& a, const Bytes& b) {
+  Bytes sum(a.size() + b.size());
+  std::copy(b.begin(), b.end(), std::copy(a.begin(), a.end(), sum.begin()));
+  return sum;
+}
 
 template <typename A, typename B>
 std::string Pair(const A& a, const B& b) {
@@ -69,64 +128,78 @@ std::string Pair(const A& a, const B& b) {
   out << a << " vs " << b;
   return out.str();
 }
-std::string Pair(const Bytes& a, const Bytes& b);
+
+inline std::string Pair(const Bytes& a, const Bytes& b) {
+  auto first = std::mismatch(a.begin(), a.end(), b.begin(), b.end()).first - a.begin();
+  return "sizes " + std::to_string(a.size()) + " and " + std::to_string(b.size()) + ", first difference at " +
+         std::to_string(first);
+}
 
 template <typename A, typename B>
 bool CheckEq(const A& a, const B& b, const char* file, int line, const char* what) {
   return Check(a == b, file, line, std::string(what) + " (" + Pair(a, b) + ")");
 }
 
-class MtdDevice {
- public:
-  explicit MtdDevice(const std::string& path) : fd_(::open(path.c_str(), O_RDWR | O_SYNC)) {
-    if (fd_ >= 0) ::ioctl(fd_, MEMGETINFO, &info_);
+struct MtdDevice {
+  // A device that does not open fails the scenario.
+  explicit MtdDevice(const std::string& path) : fd(::open(path.c_str(), O_RDWR | O_SYNC)) {
+    if (Check(fd >= 0, __FILE__, __LINE__, "open " + path)) ::ioctl(fd, MEMGETINFO, &info);
   }
   ~MtdDevice() {
-    if (fd_ >= 0) ::close(fd_);
+    if (fd >= 0) ::close(fd);
   }
-  bool ok() const { return fd_ >= 0; }
-  int fd() const { return fd_; }
-  const mtd_info_user& info() const { return info_; }
   // Each returns the system call's result; errno tells why it failed.
-  long Write(std::uint64_t at, const Bytes& data) { return ::pwrite(fd_, data.data(), data.size(), at); }
-  long Read(std::uint64_t at, Bytes& data) { return ::pread(fd_, data.data(), data.size(), at); }
+  long Write(std::uint64_t at, const Bytes& data) { return ::pwrite(fd, data.data(), data.size(), at); }
+  long Read(std::uint64_t at, Bytes& data) { return ::pread(fd, data.data(), data.size(), at); }
   int Erase(std::uint64_t at, std::uint64_t length) {
     erase_info_user region{static_cast<__u32>(at), static_cast<__u32>(length)};
-    return ::ioctl(fd_, MEMERASE, &region);
+    return ::ioctl(fd, MEMERASE, &region);
   }
   int IsBad(std::uint64_t at) { return BlockIoctl(MEMGETBADBLOCK, at); }
   int MarkBad(std::uint64_t at) { return BlockIoctl(MEMSETBADBLOCK, at); }
-  bool EccStats(mtd_ecc_stats& stats) { return ::ioctl(fd_, ECCGETSTATS, &stats) == 0; }
+  bool EccStats(mtd_ecc_stats& stats) { return ::ioctl(fd, ECCGETSTATS, &stats) == 0; }
+
   // The bytes at an offset; empty when the read fell short.
-  Bytes ReadAll(std::uint64_t at, std::size_t length);
+  Bytes ReadAll(std::uint64_t at, std::size_t length) {
+    Bytes data(length);
+    return Read(at, data) == static_cast<long>(length) ? data : Bytes();
+  }
   // Numbers of the bad (or the good) blocks.
-  std::vector<std::uint64_t> Blocks(bool bad = true);
-  // Erases every good block; false when an erase failed.
-  bool EraseAllGood();
+  std::vector<std::uint64_t> Blocks(bool bad = true) {
+    std::vector<std::uint64_t> blocks;
+    for (std::uint64_t at = 0; at < info.size; at += info.erasesize)
+      if ((IsBad(at) > 0) == bad) blocks.push_back(at / info.erasesize);
+    return blocks;
+  }
   // The good blocks' contents one after the other, as nanddump
   // --bb=skipbad gives them.
-  Bytes GoodBlocks();
+  Bytes GoodBlocks() {
+    Bytes all;
+    for (auto block : Blocks(false)) all = all + ReadAll(block * info.erasesize, info.erasesize);
+    return all;
+  }
   // The offset counted over good blocks (as the library addresses a NAND
   // slot) of a physical block.
-  std::uint64_t LogicalOf(std::uint64_t block);
-
- private:
+  std::uint64_t LogicalOf(std::uint64_t block) {
+    auto good = Blocks(false);
+    return std::count_if(good.begin(), good.end(), [&](std::uint64_t b) { return b < block; }) * info.erasesize;
+  }
   int BlockIoctl(unsigned long request, std::uint64_t at) {
     loff_t offset = static_cast<loff_t>(at);
-    return ::ioctl(fd_, request, &offset);
+    return ::ioctl(fd, request, &offset);
   }
-  int fd_;
-  mtd_info_user info_{};
+
+  int fd;
+  mtd_info_user info{};
 };
 
 }  // namespace systest
 
 #define SYSTEST_CAT2(a, b) a##b
 #define SYSTEST_CAT(a, b) SYSTEST_CAT2(a, b)
-#define SCENARIO(name)                                                                   \
-  static void SYSTEST_CAT(scenario_, __LINE__)();                                         \
-  static ::systest::Registrar SYSTEST_CAT(registrar_, __LINE__)(name,                     \
-                                                                SYSTEST_CAT(scenario_, __LINE__)); \
+#define SCENARIO(name)                                                                              \
+  static void SYSTEST_CAT(scenario_, __LINE__)();                                                    \
+  static ::systest::Registrar SYSTEST_CAT(registrar_, __LINE__)(name, SYSTEST_CAT(scenario_, __LINE__)); \
   static void SYSTEST_CAT(scenario_, __LINE__)()
 
 #define CHECK(cond) ::systest::Check(static_cast<bool>(cond), __FILE__, __LINE__, #cond)
