@@ -130,6 +130,7 @@ TEST_F(EraseTest, NorSlotErasesWholeSectorsOnly) {
   EXPECT_TRUE(log.Contains("FlashInterface::EraseSlot: Location NOR0.BOOT.NONE not found\r\n"));
   Location nodevice = MakeLocation("XYZ", "A", "B");
   EXPECT_FALSE(flash.EraseSlot(&nodevice));
+  EXPECT_FALSE(flash.EraseSector(&nodevice));
   EXPECT_TRUE(log.Contains("Device XYZ.A.B not found\r\n"));
   Location noNode = MakeLocation("NAND0", "SYS", "NONE");
   EXPECT_FALSE(flash.EraseSlot(&noNode));
