@@ -80,24 +80,18 @@ TEST(DataEntryInPlace, MemoryPayloadStaysAndIsCopiedOutInChunksOfOneKibibyte) {
   Intruder out(all.data(), 2500);
   EXPECT_TRUE(e.GetInPlaceData(&out));
   EXPECT_EQ(all, payload);
-  for (unsigned int room : {2047u, 2499u}) {  // a chunk that does not fit is not written
-    Bytes part(room);
-    Intruder small(part.data(), room);
-    LogCapture capture;
-    EXPECT_FALSE(e.GetInPlaceData(&small));
-    EXPECT_EQ(Written(small).size(), room == 2047u ? 1024u : 2048u);
-    EXPECT_EQ(RecordTexts(capture), Texts{"DataEntry::GetInPlaceData: unable to store data\r\n"});
-  }
+  Bytes part(2499);
+  Intruder small(part.data(), 2499);
+  LogCapture capture;
+  EXPECT_FALSE(e.GetInPlaceData(&small));
+  EXPECT_EQ(Written(small).size(), 2048u) << "a chunk that does not fit is not written";
   e.length = 2600;  // more than the source holds
   Bytes sink(2600);
   Intruder roomy(sink.data(), 2600);
-  LogCapture capture;
   EXPECT_FALSE(e.GetInPlaceData(&roomy));
-  EXPECT_EQ(RecordTexts(capture), Texts{"DataEntry::GetInPlaceData: unable to read data\r\n"});
-  DataEntry owned;
-  EXPECT_FALSE(owned.GetInPlaceData(&out)) << "no payload";
-  owned.CreateData(2);
-  EXPECT_FALSE(owned.GetInPlaceData(&out)) << "no source";
+  EXPECT_EQ(RecordTexts(capture), (Texts{"DataEntry::GetInPlaceData: unable to store data\r\n",
+                                         "DataEntry::GetInPlaceData: unable to read data\r\n"}));
+  EXPECT_FALSE(DataEntry().GetInPlaceData(&out)) << "no payload";
 }
 
 TEST(DataEntryInPlace, FileSourceIsReachedThroughTheStream) {

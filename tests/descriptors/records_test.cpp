@@ -242,6 +242,7 @@ TEST(Containers, DispatchOnNestedTypesAndSkipPaddingAndUnknownEntries) {
   BuildConfig config;
   LogCapture capture;
   ReadWhole(info, Golden("fsbl_info.bin"));
+  EXPECT_EQ(info.versionEntry.sequenceControl.nvSequence, 7u) << "a nested version entry's optional fields";
   EXPECT_EQ(std::tie(info.deviceConfig.scbClock, info.deviceConfig.avsEnabled), std::make_tuple(432, 1));
   EXPECT_EQ(info.memConfig.memoryControllers.size(), 2u);
   EXPECT_EQ(info.BseckInfo.ReloadErrors.size(), 3u);

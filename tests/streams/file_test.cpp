@@ -162,7 +162,9 @@ void StdinKeepsAHistoryToGoBackInto() {
   CHILD_CHECK(pipe(fds) == 0 && write(fds[1], data.data(), 3000) == 3000, 90);
   ::close(fds[1]);
   dup2(fds[0], 0);
+  ::close(fds[0]);
   clearerr(stdin);
+  (void)Extruder(data.data(), 1);  // a memory stream's destruction leaves descriptor 0 alone
   Extruder in(stdin);
   Bytes buf(2000);
   unsigned int u = 0;
