@@ -104,17 +104,17 @@ TEST(HardDriveProbeNodePosition, CountsListedDevicesScansNoMoreNodesAndFindsTheH
   EXPECT_EQ(std::memcmp(&drive, &cleared, sizeof drive), 0);
   // The first entry's line is read in pieces of 255; the next piece starts with "Host:".
   sys.files["/proc/scsi/scsi"] = "Attached devices:\nHost: scsi0 " + std::string(243, 'x') +
-                                 "Host: scsi9\n  Vendor: ATA\n";
+                                 "Host: scsi9\nHost: scsi1 Channel: 00\n";
   sys.links["sda"] = kUsbLink;  // a small stick
   sys.devices["/dev/sda"].size = 8LL << 30;
   // Only a "/hostN/" component below 2^32 - 1 names the host.
-  sys.links["sdb"] = "../../devices/hostx/host7x/host4294967295/ata3/host12/target12:0:0/block/sdb";
-  EXPECT_EQ(HardDriveProbeNodePosition(&drive), 0);
-  EXPECT_EQ(drive.scsiDeviceCount, 1u);
+  sys.links["sdc"] = "../../devices/hostx/host7x/host4294967295/ata3/host12/target12:0:0/block/sdc";
+  EXPECT_EQ(HardDriveProbeNodePosition(&drive), 0);  // sdc lies beyond the two devices listed
+  EXPECT_EQ(drive.scsiDeviceCount, 2u);
   sys.files["/proc/scsi/scsi"] = "Attached devices:\n";
   EXPECT_EQ(HardDriveProbeSataPosition(&drive), 0);
   EXPECT_EQ(HardDriveScanDeviceNode(&drive), 1);  // every node again
-  EXPECT_EQ(drive.deviceNode, 1);
+  EXPECT_EQ(drive.deviceNode, 2);
   EXPECT_EQ(drive.scsiBus, 12u);
   const std::string sata = kError + "HardDriveProbeSataPosition] ";
   const std::string notFound = kError + "HardDriveScanDeviceNode] Hard Drive Not Found\n\r";
