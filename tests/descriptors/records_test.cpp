@@ -290,8 +290,18 @@ TEST(Containers, StopAtTheFirstFailingOrMissingEntry) {
   for (const auto& c : cases) EXPECT_EQ(c.read(c.bytes, c.bytes.size()), c.status) << &c - cases;
 }
 
-std::string R(const char* field) { return std::string("Error reading ") + field + "\r\n"; }
-std::string W(const char* field) { return std::string("Error writing ") + field + "\r\n"; }
+// "Error <verb> <field>\r\n" for each field of a '|'-separated list; a field
+// that starts with '!' is a whole message.
+Texts Messages(const char* verb, const std::string& fields) {
+  Texts texts;
+  for (size_t at = 0, end = 0; at < fields.size(); at = end + 1) {
+    end = std::min(fields.find('|', at), fields.size());
+    const std::string field = fields.substr(at, end - at);
+    const std::string text = field[0] == '!' ? field.substr(1) : "Error " + std::string(verb) + " " + field;
+    texts.push_back(text + "\r\n");
+  }
+  return texts;
+}
 
 // The record cut short at every byte from `from` to `to` in turn: its
 // statuses, each change once, and every message, each text once, in the
@@ -330,74 +340,65 @@ TEST(RecordMessages, StreamsAndBuffersEndingInsideEachField) {
   Append(fsbl, Entry("MCFG", {0, 0}));
   Append(fsbl, Entry("BSCK", {0, 0, 0, 0}));
   fsbl = Entry("FSBL", fsbl);
-  const char* const seq = "(uint8_t *)controlledSequenceName";
-  const std::string mcet = "Insufficient memory to add entry of type MCET\r\n";
-  const std::string pkgHeader = "packageHeaderLocation";
+  const char* const in = "reading";
+  const char* const out = "writing";
   const struct {
     unsigned int (*cut)(const Bytes&, size_t);
     const Bytes& bytes;
     size_t from, to;  // 0: the record's length
     std::vector<unsigned int> statuses;
-    Texts messages;
+    const char* verb;
+    std::string fields;
   } cases[] = {
-      {ReadCut<VersionEntry>, vers, 0, 0, {0xA012, 0},
-       {R("storedEntryType"), R("entrySize"), R("localFlags"), R("localMajorVer"), R("minorVer"),
-        R("majorVersion"), R("minorVersion"), R("_temp"), R("entryType"), R("description"),
-        R("versionLetter"), R("pad"), R(seq), R("sequenceControl"), R("otpEpoch"), R("nvSequence")}},
-      {ReadCut<BseckReloadDescriptor>, bsck, 12, 0, {0xA012, 0},
-       {R("ExecutingType"), R("numReloadError"), R("flags"), R("ReloadErrors"), R("majorVer"), R("minorVer"),
-        R("Type"), R("Error")}},
-      {ReadCut<DeviceConfigDescriptor>, devc, 12, 0, {0xA012, 0},
-       {R("scbClock"), R("avsEnabled"), R("reserved")}},
-      {ReadCut<MemoryConfigDescriptor>, mcfg, 12, 64, {0xA012},
-       {R("numControllers"), R("reserved"), R("storedEntryType"), R("memoryControllers"), R("entrySize"),
-        R("localFlags"), R("localMajorVer"), R("minorVer"), R("ddrCfgWidth"), R("ddrSize"), R("ddrSpeed"),
-        R("ddrDevTech"), R("ddrMode"), R("ddrDevWidth"), R("numSegments"), R("memorySegments"),
-        R("segmentPhysicalAddressStart"), R("segmentSize")}},
-      {ReadCut<MemoryConfigDescriptor>, old, 26, 33, {0xA012},
-       {R("memoryControllerNumber"), R("memoryControllers"), R("numSegments")}},
-      {ReadCut<FSBLInfo>, fsbl, 12, 0, {0xA012, 0},
-       {R("storedEntryType"), R("versionEntry"), R("entrySize"), R("localFlags"), R("localMajorVer"),
-        R("minorVer"), R("majorVersion"), R("minorVersion"), R("_temp"), R("entryType"), R("description"),
-        R("numDescriptors"), R("deviceConfig"), R("scbClock"), R("avsEnabled"), R("reserved"),
-        "Unknown entry type 0x5A5A5A5A in FSBL info\r\n", R("memConfig"), R("numControllers"), R("BseckInfo"),
-        R("ExecutingType"), R("numReloadError")}},
-      {ReadCut<BuildConfig>, bldc, 12, 0, {0xA012, 0},
-       {R("componentTag"), R("(uint8_t *)componentMajorVer"), R("(uint8_t *)componentMinorVer"),
-        R("componentVerLetter"), R("reserved"), R("unused1"), R("numDescriptors"), R("entrySize"),
-        R("sequenceControl"), R("localFlags"), R("localMajorVer"), R("minorVer"), R(seq),
-        R("otpEpoch"), R("nvSequence"), R("buildEnvironment"), R("entryType")}},
-      {ReadCut<AnimatedFrontPanelDisplayEntry>, afpd, 12, 0, {0xA012, 0},
-       {R("entryType"), R("text"), R("entrySize")}},
-      {ReadCut<CodeObjectInfo>, pkg, 0, 0, {0xA012, 0xA004, 0xA012, 0xA004, 0},
-       {R("unused"), R("componentTag"), R(pkgHeader.c_str()), R("deviceName"), R("(*pLocationStorage)"),
-        R("partitionName"), R("slotName"), R("slotOffset"), R("numComponents"), R("componentLocations[i]")}},
-      {StoreCut<VersionEntry, true>, vers, 0, 11, {0xA012},
-       {W("entryType"), "Insufficient memory to add entry of type VERS\r\n", W("flags"), W("majorVer"),
-        W("minorVer")}},
+      {ReadCut<VersionEntry>, vers, 0, 0, {0xA012, 0}, in,
+       "storedEntryType|entrySize|localFlags|localMajorVer|minorVer|majorVersion|minorVersion|_temp|"
+       "entryType|description|versionLetter|pad|(uint8_t *)controlledSequenceName|sequenceControl|otpEpoch|"
+       "nvSequence"},
+      {ReadCut<BseckReloadDescriptor>, bsck, 12, 0, {0xA012, 0}, in,
+       "ExecutingType|numReloadError|flags|ReloadErrors|majorVer|minorVer|Type|Error"},
+      {ReadCut<DeviceConfigDescriptor>, devc, 12, 0, {0xA012, 0}, in, "scbClock|avsEnabled|reserved"},
+      {ReadCut<MemoryConfigDescriptor>, mcfg, 12, 64, {0xA012}, in,
+       "numControllers|reserved|storedEntryType|memoryControllers|entrySize|localFlags|localMajorVer|"
+       "minorVer|ddrCfgWidth|ddrSize|ddrSpeed|ddrDevTech|ddrMode|ddrDevWidth|numSegments|memorySegments|"
+       "segmentPhysicalAddressStart|segmentSize"},
+      {ReadCut<MemoryConfigDescriptor>, old, 26, 33, {0xA012}, in,
+       "memoryControllerNumber|memoryControllers|numSegments"},
+      {ReadCut<FSBLInfo>, fsbl, 12, 0, {0xA012, 0}, in,
+       "storedEntryType|versionEntry|entrySize|localFlags|localMajorVer|minorVer|majorVersion|minorVersion|"
+       "_temp|entryType|description|numDescriptors|deviceConfig|scbClock|avsEnabled|reserved|"
+       "!Unknown entry type 0x5A5A5A5A in FSBL info|memConfig|numControllers|BseckInfo|ExecutingType|"
+       "numReloadError"},
+      {ReadCut<BuildConfig>, bldc, 12, 0, {0xA012, 0}, in,
+       "componentTag|(uint8_t *)componentMajorVer|(uint8_t *)componentMinorVer|componentVerLetter|reserved|"
+       "unused1|numDescriptors|entrySize|sequenceControl|localFlags|localMajorVer|minorVer|"
+       "(uint8_t *)controlledSequenceName|otpEpoch|nvSequence|buildEnvironment|entryType"},
+      {ReadCut<AnimatedFrontPanelDisplayEntry>, afpd, 12, 0, {0xA012, 0}, in, "entryType|text|entrySize"},
+      {ReadCut<CodeObjectInfo>, pkg, 0, 0, {0xA012, 0xA004, 0xA012, 0xA004, 0}, in,
+       "unused|componentTag|packageHeaderLocation|deviceName|(*pLocationStorage)|partitionName|slotName|"
+       "slotOffset|numComponents|componentLocations[i]"},
+      {StoreCut<VersionEntry, true>, vers, 0, 11, {0xA012}, out,
+       "entryType|!Insufficient memory to add entry of type VERS|flags|majorVer|minorVer"},
       // The sequence-control block's failure is not looked at.
-      {StoreCut<VersionEntry>, vers, 0, 57, {0xA012, 0xA004, 0xA012, 0},
-       {W("majorVersion"), W("minorVersion"), W("_temp"), W("DATA_ENTRY_TYPE"), W("description"), W("length"),
-        W("pPayload"), W("versionLetter"), W("pad"), W(seq), W("otpEpoch"), W("nvSequence")}},
-      {StoreCut<BseckReloadDescriptor>, bsck, 0, 28, {0xA012, 0xA004, 0},
-       {W("ExecutingType"), W("numReloadError"), W("flags"), W("ReloadErrors"), W("majorVer"), W("minorVer"),
-        W("Type"), W("Error")}},
-      {StoreCut<MemoryConfigDescriptor>, mcfg, 0, 52, {0xA012, 0xA004},
-       {W("numControllers"), W("reserved"), W("entryType"), W("memoryControllers"), mcet, W("flags"),
-        W("majorVer"), W("minorVer"), W("ddrCfgWidth"), W("ddrSize"), W("ddrSpeed"), W("ddrDevTech"),
-        W("ddrMode"), W("ddrDevWidth"), W("numSegments"), W("memorySegments"),
-        "Insufficient memory to add entry of type MCSD\r\n", W("segmentPhysicalAddressStart"),
-        W("segmentSize")}},
-      {StoreCut<AnimatedFrontPanelDisplayEntry>, afpd, 0, 14, {0xA004, 0},
-       {W("DATA_ENTRY_TYPE"), W("text"), W("length"), W("pPayload")}},
-      {StoreCut<CodeObjectInfo>, pkg, 0, 114, {0xA012, 0xA004, 0xA012, 0xA004, 0},
-       {W("unused"), W("componentTag"), W(pkgHeader.c_str()), W("deviceName"), W("partitionName"),
-        W("slotName"), W("slotOffset"), W("numComponents"), W("componentLocations[i]")}},
+      {StoreCut<VersionEntry>, vers, 0, 57, {0xA012, 0xA004, 0xA012, 0}, out,
+       "majorVersion|minorVersion|_temp|DATA_ENTRY_TYPE|description|length|pPayload|versionLetter|pad|"
+       "(uint8_t *)controlledSequenceName|otpEpoch|nvSequence"},
+      {StoreCut<BseckReloadDescriptor>, bsck, 0, 28, {0xA012, 0xA004, 0}, out,
+       "ExecutingType|numReloadError|flags|ReloadErrors|majorVer|minorVer|Type|Error"},
+      {StoreCut<MemoryConfigDescriptor>, mcfg, 0, 52, {0xA012, 0xA004}, out,
+       "numControllers|reserved|entryType|memoryControllers|!Insufficient memory to add entry of type MCET|"
+       "flags|majorVer|minorVer|ddrCfgWidth|ddrSize|ddrSpeed|ddrDevTech|ddrMode|ddrDevWidth|numSegments|"
+       "memorySegments|!Insufficient memory to add entry of type MCSD|segmentPhysicalAddressStart|"
+       "segmentSize"},
+      {StoreCut<AnimatedFrontPanelDisplayEntry>, afpd, 0, 14, {0xA004, 0}, out,
+       "DATA_ENTRY_TYPE|text|length|pPayload"},
+      {StoreCut<CodeObjectInfo>, pkg, 0, 114, {0xA012, 0xA004, 0xA012, 0xA004, 0}, out,
+       "unused|componentTag|packageHeaderLocation|deviceName|partitionName|slotName|slotOffset|numComponents|"
+       "componentLocations[i]"},
   };
   for (const auto& c : cases) {
     const Sweep sweep = CutEverywhere(c.cut, c.bytes, c.from, c.to != 0 ? c.to : c.bytes.size());
-    EXPECT_EQ(sweep.statuses, c.statuses) << c.messages.at(0);
-    EXPECT_EQ(sweep.messages, c.messages) << c.messages.at(0);
+    EXPECT_EQ(sweep.statuses, c.statuses) << c.fields;
+    EXPECT_EQ(sweep.messages, Messages(c.verb, c.fields)) << c.fields;
   }
 }
 
