@@ -18,12 +18,6 @@ namespace {
 
 Bytes Written(const Intruder& out) { return Bytes(out.pStart, out.pStart + (out.pCurrent - out.pStart)); }
 
-std::string Joined(const LogCapture& log) {
-  std::string all;
-  for (const auto& text : log.texts()) all += text;
-  return all;
-}
-
 // One value read with the expected code; 7 when nothing was decoded.
 template <class T>
 T Take(Extruder& in, unsigned int rc = 0) {
@@ -72,11 +66,12 @@ TEST(MemoryStreams, RefusedReadsAndWritesChangeNothingAndSayWhy) {
   EXPECT_EQ(out.intrude(static_cast<unsigned char>(5)), 3u);
   EXPECT_EQ(out.intrude(true), 2u) << "kept: the bool write answers from bytesLeft alone";
   EXPECT_EQ(bytes[3], 0xEE);
-  EXPECT_EQ(Joined(log),
-            "Can't extrude uint32_t, bytesLeft = 3\r\nCan't extrude uint32_t, bytesLeft = 3\r\n"
-            "Can't extrude uint64_t, bytesLeft = 3\r\nCan't extrude array of 5 bytes, bytesLeft = 3\r\n"
-            "Can't extrude uint16_t, bytesLeft = 1\r\nCan't extrude bool, bytesLeft = 0\r\n"
-            "Can't intrude 1 bytes, bytesLeft = 0\r\nCan't intrude 1 bytes, bytesLeft = 0\r\n");
+  const Texts expected = {
+      "Can't extrude uint32_t, bytesLeft = 3\r\n", "Can't extrude uint32_t, bytesLeft = 3\r\n",
+      "Can't extrude uint64_t, bytesLeft = 3\r\n", "Can't extrude array of 5 bytes, bytesLeft = 3\r\n",
+      "Can't extrude uint16_t, bytesLeft = 1\r\n", "Can't extrude bool, bytesLeft = 0\r\n",
+      "Can't intrude 1 bytes, bytesLeft = 0\r\n", "Can't intrude 1 bytes, bytesLeft = 0\r\n"};
+  EXPECT_EQ(log.texts(), expected);
   EXPECT_EQ(log.messages()[0].module, 0);
   EXPECT_EQ(log.messages()[0].level, 2u);
   EXPECT_EQ(log.messages()[0].sourceFile + " " + log.messages()[0].function, "../extruder extrude");
