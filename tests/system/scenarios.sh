@@ -113,20 +113,15 @@ if want kernel.nand_faults; then
 fi
 
 # ---- FlashInterface ---------------------------------------------------------------------
-# Scenarios the guest program does not know (library built without flash
-# support) are reported as skipped rather than run.
-run_flash() {
-  if "$GUEST" --list | grep -qx "$1"; then run_guest "$1"; else info "skipped $1 (not in this build)"; fi
-}
 nand_load badblocks=$BAD_AT_LOAD
 for s in flash.table flash.nand_slot flash.nand_partial_page flash.mtd_utils flash.nor flash.nor_read_only \
          flash.emmc flash.erase_slots flash.timing streams.nand_record streams.sdram; do
-  run_flash $s
+  run_guest $s
 done
 if want flash.erase_weak_block || want flash.weak_page_relocation || want flash.grave_page; then
   nand_faults
   for s in flash.erase_weak_block flash.weak_page_relocation flash.grave_page; do
-    run_flash $s
+    run_guest $s
   done
 fi
 

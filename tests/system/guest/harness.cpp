@@ -13,9 +13,10 @@ std::map<std::string, void (*)()>& Registry() {
   return scenarios;
 }
 
-// Messages may arrive while the library's objects are being constructed.
-std::vector<std::string>& LogStore() {
-  static std::vector<std::string> messages;
+// The library's messages, one after the other. They may arrive while the
+// library's objects are being constructed.
+std::string& LogText() {
+  static std::string messages;
   return messages;
 }
 
@@ -29,7 +30,6 @@ void Report(const std::string& line) {
   if (results != stdout) std::printf("systest: %s\n", line.c_str());
 }
 
-constexpr unsigned int kEverything = 99;
 // Spare entries behind the array the library indexes by module id.
 constexpr int kSpare = 64;
 
@@ -46,21 +46,18 @@ void GlobalLogUtilAdd(etLogUtilModuleId moduleId, unsigned int level, const char
   va_start(args, format);
   std::vsnprintf(text, sizeof text, format, args);
   va_end(args);
-  LogStore().emplace_back(text);
-  bool newline = text[0] != '\0' && text[std::strlen(text) - 1] == '\n';
-  std::printf("log[%d/%u] %s: %s%s", static_cast<int>(moduleId), level, functionName ? functionName : "",
-              text, newline ? "" : "\n");
+  LogText() += text;
+  std::printf("log[%d/%u] %s: %s\n", static_cast<int>(moduleId), level, functionName ? functionName : "", text);
 }
 
 }  // extern "C"
 
 namespace systest {
 
-Registrar::Registrar(const char* name, void (*fn)()) { Registry()[name] = fn; }
+bool Register(const char* name, void (*fn)()) { return Registry().emplace(name, fn).second; }
 
 bool Check(bool ok, const char* file, int line, const std::string& what) {
-  const char* base = std::strrchr(file, '/');
-  std::string failure = std::string(base ? base + 1 : file) + ":" + std::to_string(line) + ": " + what;
+  std::string failure = std::string(file) + ":" + std::to_string(line) + ": " + what;
   if (!ok) std::printf("check failed at %s\n", failure.c_str());
   if (!ok && first_failure.empty()) first_failure = failure;
   return ok;
@@ -68,28 +65,22 @@ bool Check(bool ok, const char* file, int line, const std::string& what) {
 
 void Info(const std::string& text) { Report("INFO " + text); }
 
-bool LogContains(const std::string& text) {
-  auto& log = LogStore();
-  return std::any_of(log.begin(), log.end(), [&](const std::string& m) { return m.find(text) != m.npos; });
-}
+bool LogContains(const std::string& text) { return LogText().find(text) != std::string::npos; }
 
-void ClearLog() { LogStore().clear(); }
+void ClearLog() { LogText().clear(); }
 
 }  // namespace systest
 
 int main(int argc, char** argv) {
+  // Usage: stbplat_systest <scenario>; without one, it lists the scenarios.
   if (argc != 2) {
-    std::fprintf(stderr, "usage: %s <scenario> | --list\n", argv[0]);
-    return 2;
-  }
-  if (std::strcmp(argv[1], "--list") == 0) {
     for (const auto& entry : Registry()) std::printf("%s\n", entry.first.c_str());
-    return 0;
+    return 2;
   }
   const char* path = std::getenv("STBPLAT_SYSTEST_RESULTS");
   FILE* file = path != nullptr ? std::fopen(path, "a") : nullptr;
   if (file != nullptr) results = file;
-  for (int i = 0; i < eLogModuleCount; ++i) subSystemLogLevel[i] = kEverything;
+  for (int i = 0; i < eLogModuleCount; ++i) subSystemLogLevel[i] = 99;  // everything
   auto it = Registry().find(argv[1]);
   if (it == Registry().end()) first_failure = "no such scenario";
   if (it != Registry().end()) it->second();

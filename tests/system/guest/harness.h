@@ -11,21 +11,18 @@
 #include <fcntl.h>
 #include <mtd/mtd-abi.h>
 #include <sys/ioctl.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
-#include <cctype>
-#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <functional>
-#include <iterator>
 #include <random>
 #include <sstream>
 #include <string>
+#include <type_traits>
 #include <vector>
 
 namespace systest {
@@ -40,28 +37,27 @@ constexpr unsigned long kNorChip = 0x400000;
 constexpr unsigned long kNorSector = 0x10000;
 constexpr unsigned long kNorPart = 0x80000;
 
-struct Registrar {
-  Registrar(const char* name, void (*fn)());
-};
+// Adds a scenario to the program (SCENARIO does it).
+bool Register(const char* name, void (*fn)());
 
 // Records a failure of the running scenario (the first one is reported)
 // unless ok; returns ok.
 bool Check(bool ok, const char* file, int line, const std::string& what);
 // A line for the host's summary ("INFO <text>").
 void Info(const std::string& text);
-// Log messages the library produced since the last ClearLog.
+// Whether a log message the library produced since the last ClearLog
+// contains the text.
 bool LogContains(const std::string& text);
 void ClearLog();
 
-// Runs a shell command, returns its exit status (-1 when it could not run).
-inline int Shell(const std::string& command) {
+// Runs a shell command; true when it ran and exited with status 0.
+inline bool Shell(const std::string& command) {
   std::fflush(stdout);
-  int status = std::system(command.c_str());
-  return status == -1 || !WIFEXITED(status) ? -1 : WEXITSTATUS(status);
+  return std::system(command.c_str()) == 0;
 }
 
 // Erases a flash partition with mtd-utils (which pass bad blocks over).
-inline bool FlashErase(const std::string& node) { return Shell("flash_erase -q " + node + " 0 0") == 0; }
+inline bool FlashErase(const std::string& node) { return Shell("flash_erase -q " + node + " 0 0"); }
 
 inline Bytes ReadFile(const std::string& path) {
   std::ifstream in(path, std::ios::binary);
@@ -77,22 +73,20 @@ inline bool WriteFile(const std::string& path, const Bytes& data) {
 // What fn printed on file descriptor 1 (child processes included).
 inline std::string CaptureStdout(const std::function<void()>& fn) {
   std::fflush(stdout);
-  int saved = ::dup(1), fd = ::open("/tmp/systest-stdout", O_WRONLY | O_CREAT | O_TRUNC, 0644);
-  ::dup2(fd, 1);
-  ::close(fd);
+  int saved = ::dup(1);
+  std::freopen("/tmp/systest-stdout", "w", stdout);
   fn();
   std::fflush(stdout);
   ::dup2(saved, 1);
   ::close(saved);
   Bytes text = ReadFile("/tmp/systest-stdout");
-  std::fwrite(text.data(), 1, text.size(), stdout);  // keep it in the console log too
   return std::string(text.begin(), text.end());
 }
 
 // What a shell command printed, less trailing white space.
 inline std::string ShellOutput(const std::string& command) {
   std::string out = CaptureStdout([&] { Shell(command); });
-  while (!out.empty() && std::isspace(static_cast<unsigned char>(out.back()))) out.pop_back();
+  while (!out.empty() && out.back() <= ' ') out.pop_back();
   return out;
 }
 
@@ -122,52 +116,42 @@ inline Bytes operator+(const Bytes& a, const Bytes& b) {
   return sum;
 }
 
-template <typename A, typename B>
-std::string Pair(const A& a, const B& b) {
-  std::ostringstream out;
-  out << a << " vs " << b;
-  return out.str();
-}
-
-inline std::string Pair(const Bytes& a, const Bytes& b) {
-  auto first = std::mismatch(a.begin(), a.end(), b.begin(), b.end()).first - a.begin();
-  return "sizes " + std::to_string(a.size()) + " and " + std::to_string(b.size()) + ", first difference at " +
-         std::to_string(first);
-}
-
+// Checks a == b; a failure shows both sides (of bytes, the sizes).
 template <typename A, typename B>
 bool CheckEq(const A& a, const B& b, const char* file, int line, const char* what) {
-  return Check(a == b, file, line, std::string(what) + " (" + Pair(a, b) + ")");
+  std::ostringstream out;
+  if constexpr (std::is_same_v<A, Bytes>) out << " (sizes " << a.size() << " and " << b.size() << ")";
+  if constexpr (!std::is_same_v<A, Bytes>) out << " (" << a << " vs " << b << ")";
+  return a == b || Check(false, file, line, what + out.str());
 }
 
 struct MtdDevice {
-  // A device that does not open fails the scenario.
-  explicit MtdDevice(const std::string& path) : fd(::open(path.c_str(), O_RDWR | O_SYNC)) {
-    if (Check(fd >= 0, __FILE__, __LINE__, "open " + path)) ::ioctl(fd, MEMGETINFO, &info);
+  // A device that does not open (or, when asked, erase its good blocks with
+  // flash_erase) fails the scenario.
+  explicit MtdDevice(const std::string& path, bool erase = false) : fd(::open(path.c_str(), O_RDWR | O_SYNC)) {
+    if (Check(fd >= 0, __FILE_NAME__, __LINE__, "open " + path)) ::ioctl(fd, MEMGETINFO, &info);
+    if (erase) Check(FlashErase(path), __FILE_NAME__, __LINE__, "flash_erase " + path);
   }
-  ~MtdDevice() {
-    if (fd >= 0) ::close(fd);
-  }
+  ~MtdDevice() { ::close(fd); }
   // Each returns the system call's result; errno tells why it failed.
-  long Write(std::uint64_t at, const Bytes& data) { return ::pwrite(fd, data.data(), data.size(), at); }
-  long Read(std::uint64_t at, Bytes& data) { return ::pread(fd, data.data(), data.size(), at); }
-  int Erase(std::uint64_t at, std::uint64_t length) {
-    erase_info_user region{static_cast<__u32>(at), static_cast<__u32>(length)};
-    return ::ioctl(fd, MEMERASE, &region);
+  long Write(unsigned long at, const Bytes& data) { return ::pwrite(fd, data.data(), data.size(), at); }
+  long Read(unsigned long at, Bytes& data) { return ::pread(fd, data.data(), data.size(), at); }
+  int Erase(unsigned long at, unsigned long length) {
+    return Ioctl(MEMERASE, erase_info_user{__u32(at), __u32(length)});
   }
-  int IsBad(std::uint64_t at) { return BlockIoctl(MEMGETBADBLOCK, at); }
-  int MarkBad(std::uint64_t at) { return BlockIoctl(MEMSETBADBLOCK, at); }
+  int IsBad(unsigned long at) { return Ioctl(MEMGETBADBLOCK, loff_t(at)); }
+  int MarkBad(unsigned long at) { return Ioctl(MEMSETBADBLOCK, loff_t(at)); }
   bool EccStats(mtd_ecc_stats& stats) { return ::ioctl(fd, ECCGETSTATS, &stats) == 0; }
 
   // The bytes at an offset; empty when the read fell short.
-  Bytes ReadAll(std::uint64_t at, std::size_t length) {
+  Bytes ReadAll(unsigned long at, std::size_t length) {
     Bytes data(length);
     return Read(at, data) == static_cast<long>(length) ? data : Bytes();
   }
   // Numbers of the bad (or the good) blocks.
-  std::vector<std::uint64_t> Blocks(bool bad = true) {
-    std::vector<std::uint64_t> blocks;
-    for (std::uint64_t at = 0; at < info.size; at += info.erasesize)
+  std::vector<unsigned long> Blocks(bool bad = true) {
+    std::vector<unsigned long> blocks;
+    for (unsigned long at = 0; at < info.size; at += info.erasesize)
       if ((IsBad(at) > 0) == bad) blocks.push_back(at / info.erasesize);
     return blocks;
   }
@@ -178,15 +162,9 @@ struct MtdDevice {
     for (auto block : Blocks(false)) all = all + ReadAll(block * info.erasesize, info.erasesize);
     return all;
   }
-  // The offset counted over good blocks (as the library addresses a NAND
-  // slot) of a physical block.
-  std::uint64_t LogicalOf(std::uint64_t block) {
-    auto good = Blocks(false);
-    return std::count_if(good.begin(), good.end(), [&](std::uint64_t b) { return b < block; }) * info.erasesize;
-  }
-  int BlockIoctl(unsigned long request, std::uint64_t at) {
-    loff_t offset = static_cast<loff_t>(at);
-    return ::ioctl(fd, request, &offset);
+  template <typename Argument>
+  int Ioctl(unsigned long request, Argument argument) {
+    return ::ioctl(fd, request, &argument);
   }
 
   int fd;
@@ -197,18 +175,17 @@ struct MtdDevice {
 
 #define SYSTEST_CAT2(a, b) a##b
 #define SYSTEST_CAT(a, b) SYSTEST_CAT2(a, b)
-#define SCENARIO(name)                                                                              \
-  static void SYSTEST_CAT(scenario_, __LINE__)();                                                    \
-  static ::systest::Registrar SYSTEST_CAT(registrar_, __LINE__)(name, SYSTEST_CAT(scenario_, __LINE__)); \
+#define SCENARIO(name)                                                                               \
+  static void SYSTEST_CAT(scenario_, __LINE__)();                                                     \
+  static bool SYSTEST_CAT(added_, __LINE__) = ::systest::Register(name, SYSTEST_CAT(scenario_, __LINE__)); \
   static void SYSTEST_CAT(scenario_, __LINE__)()
 
-#define CHECK(cond) ::systest::Check(static_cast<bool>(cond), __FILE__, __LINE__, #cond)
-#define CHECK_EQ(a, b) ::systest::CheckEq((a), (b), __FILE__, __LINE__, #a " == " #b)
+#define CHECK(cond) ::systest::Check(static_cast<bool>(cond), __FILE_NAME__, __LINE__, #cond)
+#define CHECK_EQ(a, b) ::systest::CheckEq((a), (b), __FILE_NAME__, __LINE__, #a " == " #b)
 #define CHECK_LOG(text) \
-  ::systest::Check(::systest::LogContains(text), __FILE__, __LINE__, std::string("log lacks: ") + (text))
+  ::systest::Check(::systest::LogContains(text), __FILE_NAME__, __LINE__, "log lacks " #text)
 // Stops the scenario when the condition fails (later steps would only
 // repeat the failure).
-#define REQUIRE(cond) \
-  if (!CHECK(cond)) return
+#define REQUIRE(cond) if (!CHECK(cond)) return
 
 #endif
