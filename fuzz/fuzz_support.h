@@ -21,12 +21,15 @@ namespace fuzz {
 constexpr unsigned int kStoreBufferSize = 1u << 16;
 
 // Stores `record` with `store(record, intruder)` into a fresh buffer; returns
-// false when the store fails.
+// false when the store fails or fills the whole buffer.
 template <typename StoreFn>
 bool StoreToBytes(StoreFn store, std::vector<unsigned char>* out) {
   out->assign(kStoreBufferSize, 0);
   Intruder intruder(out->data(), kStoreBufferSize);
-  if (store(intruder) != 0) return false;
+  // A store that fills the buffer to its last byte may have been cut short
+  // without saying so: the version record does not look at its sequence
+  // control's status.
+  if (store(intruder) != 0 || intruder.bytesLeft == 0) return false;
   out->resize(static_cast<size_t>(intruder.pCurrent - intruder.pStart));
   return true;
 }

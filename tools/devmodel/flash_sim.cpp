@@ -29,7 +29,8 @@ const os::SysCalls& Libc() { return os::LibcSysCalls(); }
 }  // namespace
 
 struct FlashSim::Handle {
-  std::string path;  // empty for /dev/mem
+  // Null for /dev/mem. An open node outlives its unlinking, as a file does.
+  std::shared_ptr<Node> node;
   uint64_t position = 0;
   bool devMem = false;
   bool writable = true;
@@ -257,9 +258,9 @@ int SimPageSize() {
 
 
 bool FlashSim::Hit(SimCall call, SimCall specific) {
-  ++counts_[call];
-  if (specific != SimCall::kAny) ++counts_[specific];
-  ++counts_[SimCall::kAny];
+  ++counts_[static_cast<size_t>(call)];
+  if (specific != SimCall::kAny) ++counts_[static_cast<size_t>(specific)];
+  ++counts_[static_cast<size_t>(SimCall::kAny)];
   // Every matching fault counts the call, whichever of them fires.
   bool fire = false;
   int error = 0;
@@ -455,8 +456,7 @@ void FlashSim::FailCall(SimCall call, int nth, int error, bool persistent) {
 void FlashSim::ClearFaults() { faults_.clear(); }
 
 int FlashSim::CallCount(SimCall call) const {
-  auto it = counts_.find(call);
-  return it == counts_.end() ? 0 : it->second;
+  return counts_[static_cast<size_t>(call)];
 }
 
 const std::vector<std::pair<uint64_t, uint64_t>>& FlashSim::Writes(const std::string& path) const {
@@ -476,7 +476,7 @@ void FlashSim::ClearHistory() {
     entry.second->writes.clear();
     entry.second->erases.clear();
   }
-  counts_.clear();
+  counts_.fill(0);
 }
 
 int FlashSim::OpenCount() const { return static_cast<int>(handles_.size()) + openFiles_; }
@@ -501,7 +501,7 @@ int FlashSim::Open(const char* path, int flags, mode_t mode) {
       return -1;
     }
     if (node == nullptr) Create(name, SimKind::kFile, 0);
-    handle->path = name;
+    handle->node = nodes_[name];
     handle->writable = (flags & O_ACCMODE) != O_RDONLY;
   }
   int fd = firstFd_;
@@ -536,7 +536,7 @@ off64_t FlashSim::Seek(int fd, off64_t offset, int whence) {
     errno = EBADF;
     return -1;
   }
-  Node* node = Find(it->second->path);
+  Node* node = it->second->node.get();
   uint64_t size = node == nullptr ? 0 : node->Size();
   int64_t base = whence == SEEK_SET ? 0
                  : whence == SEEK_CUR ? static_cast<int64_t>(it->second->position)
@@ -556,7 +556,7 @@ ssize_t FlashSim::DescriptorTransfer(SimCall call, int fd, Transfer transfer, Pa
   if (Hit(call)) return -1;
   auto it = handles_.find(fd);
   if (it == handles_.end() && PassesThrough()) return passThrough();
-  Node* node = it == handles_.end() ? nullptr : Find(it->second->path);
+  Node* node = it == handles_.end() ? nullptr : it->second->node.get();
   if (node == nullptr) {
     errno = EBADF;
     return -1;
@@ -600,7 +600,7 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
   if (Hit(SimCall::kIoctl, specific)) return -1;
   auto it = handles_.find(fd);
   if (it == handles_.end() && PassesThrough()) return Libc().ioctl(fd, request, argument);
-  Node* node = it == handles_.end() ? nullptr : Find(it->second->path);
+  Node* node = it == handles_.end() ? nullptr : it->second->node.get();
   if (node == nullptr || !node->IsMtd()) {
     errno = node == nullptr ? EBADF : ENOTTY;
     return -1;

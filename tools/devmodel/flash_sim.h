@@ -8,6 +8,7 @@
 #ifndef STBPLAT_DEVMODEL_FLASH_SIM_H
 #define STBPLAT_DEVMODEL_FLASH_SIM_H
 
+#include <array>
 #include <cstdint>
 #include <functional>
 #include <map>
@@ -29,6 +30,7 @@ enum class SimCall {
   kAny, kOpen, kClose, kLseek, kRead, kWrite, kIoctl, kMemGetInfo, kMemErase, kEccGetStats,
   kMemGetBadBlock, kMemSetBadBlock, kFopen, kFclose, kFread, kFwrite, kFseek, kFgets, kMmap,
   kUnlink,
+  kCount,  // the number of kinds
 };
 
 class FlashSim {
@@ -140,7 +142,7 @@ class FlashSim {
   std::map<int, std::unique_ptr<Handle>> handles_;
   std::vector<std::unique_ptr<Fault>> faults_;
   std::vector<SimCall> failed_;
-  std::map<SimCall, int> counts_;
+  std::array<int, static_cast<size_t>(SimCall::kCount)> counts_{};
   std::map<int, std::string> procLines_;
   std::string procOverride_;
   bool hasOverride_ = false;
