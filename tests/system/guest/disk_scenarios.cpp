@@ -7,8 +7,6 @@
 #include "harness.h"
 #include "stbplat/disk.h"
 
-using namespace systest;
-
 const std::string kAtaFound = "IsDevHDD(): ATA HDD found \n";
 
 // A column of smartctl's own temperature line, as the library's pipe sees it.

@@ -47,12 +47,10 @@ void GlobalLogUtilAdd(etLogUtilModuleId moduleId, unsigned int level, const char
   std::vsnprintf(text, sizeof text, format, args);
   va_end(args);
   LogText() += text;
-  std::printf("log[%d/%u] %s: %s\n", static_cast<int>(moduleId), level, functionName ? functionName : "", text);
+  std::printf("log[%d/%u] %s: %s\n", int(moduleId), level, functionName ? functionName : "", text);
 }
 
 }  // extern "C"
-
-namespace systest {
 
 bool Register(const char* name, void (*fn)()) { return Registry().emplace(name, fn).second; }
 
@@ -69,8 +67,6 @@ bool LogContains(const std::string& text) { return LogText().find(text) != std::
 
 void ClearLog() { LogText().clear(); }
 
-}  // namespace systest
-
 int main(int argc, char** argv) {
   // Usage: stbplat_systest <scenario>; without one, it lists the scenarios.
   if (argc != 2) {
@@ -78,8 +74,7 @@ int main(int argc, char** argv) {
     return 2;
   }
   const char* path = std::getenv("STBPLAT_SYSTEST_RESULTS");
-  FILE* file = path != nullptr ? std::fopen(path, "a") : nullptr;
-  if (file != nullptr) results = file;
+  if (FILE* file = path != nullptr ? std::fopen(path, "a") : nullptr) results = file;
   for (int i = 0; i < eLogModuleCount; ++i) subSystemLogLevel[i] = 99;  // everything
   auto it = Registry().find(argv[1]);
   if (it == Registry().end()) first_failure = "no such scenario";

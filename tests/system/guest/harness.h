@@ -25,8 +25,6 @@
 #include <type_traits>
 #include <vector>
 
-namespace systest {
-
 using Bytes = std::vector<unsigned char>;
 
 // The box's flash in the virtual machine (see init.sh): NAND pages and
@@ -66,8 +64,7 @@ inline Bytes ReadFile(const std::string& path) {
 
 inline bool WriteFile(const std::string& path, const Bytes& data) {
   std::ofstream out(path, std::ios::binary);
-  out.write(reinterpret_cast<const char*>(data.data()), static_cast<std::streamsize>(data.size()));
-  return static_cast<bool>(out);
+  return static_cast<bool>(out.write(reinterpret_cast<const char*>(data.data()), data.size()));
 }
 
 // What fn printed on file descriptor 1 (child processes included).
@@ -98,9 +95,8 @@ inline double Seconds(const std::function<void()>& step) {
 }
 
 inline Bytes Pattern(std::size_t size, unsigned int seed) {
-  std::minstd_rand generator(seed + 1);
   Bytes data(size);
-  for (auto& b : data) b = static_cast<unsigned char>(generator() >> 8);
+  std::generate(data.begin(), data.end(), std::minstd_rand(seed + 1));
   return data;
 }
 
@@ -128,7 +124,7 @@ bool CheckEq(const A& a, const B& b, const char* file, int line, const char* wha
 struct MtdDevice {
   // A device that does not open (or, when asked, erase its good blocks with
   // flash_erase) fails the scenario.
-  explicit MtdDevice(const std::string& path, bool erase = false) : fd(::open(path.c_str(), O_RDWR | O_SYNC)) {
+  explicit MtdDevice(const std::string& path, bool erase = false) : fd(open(path.c_str(), O_RDWR | O_SYNC)) {
     if (Check(fd >= 0, __FILE_NAME__, __LINE__, "open " + path)) ::ioctl(fd, MEMGETINFO, &info);
     if (erase) Check(FlashErase(path), __FILE_NAME__, __LINE__, "flash_erase " + path);
   }
@@ -171,19 +167,16 @@ struct MtdDevice {
   mtd_info_user info{};
 };
 
-}  // namespace systest
-
 #define SYSTEST_CAT2(a, b) a##b
 #define SYSTEST_CAT(a, b) SYSTEST_CAT2(a, b)
-#define SCENARIO(name)                                                                               \
-  static void SYSTEST_CAT(scenario_, __LINE__)();                                                     \
-  static bool SYSTEST_CAT(added_, __LINE__) = ::systest::Register(name, SYSTEST_CAT(scenario_, __LINE__)); \
+#define SCENARIO(name)                                                                            \
+  static void SYSTEST_CAT(scenario_, __LINE__)();                                                 \
+  static bool SYSTEST_CAT(added_, __LINE__) = ::Register(name, SYSTEST_CAT(scenario_, __LINE__)); \
   static void SYSTEST_CAT(scenario_, __LINE__)()
 
-#define CHECK(cond) ::systest::Check(static_cast<bool>(cond), __FILE_NAME__, __LINE__, #cond)
-#define CHECK_EQ(a, b) ::systest::CheckEq((a), (b), __FILE_NAME__, __LINE__, #a " == " #b)
-#define CHECK_LOG(text) \
-  ::systest::Check(::systest::LogContains(text), __FILE_NAME__, __LINE__, "log lacks " #text)
+#define CHECK(cond) ::Check(static_cast<bool>(cond), __FILE_NAME__, __LINE__, #cond)
+#define CHECK_EQ(a, b) ::CheckEq((a), (b), __FILE_NAME__, __LINE__, #a " == " #b)
+#define CHECK_LOG(text) ::Check(::LogContains(text), __FILE_NAME__, __LINE__, "log lacks " #text)
 // Stops the scenario when the condition fails (later steps would only
 // repeat the failure).
 #define REQUIRE(cond) if (!CHECK(cond)) return
