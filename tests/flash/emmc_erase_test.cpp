@@ -2,8 +2,6 @@
 #include <cerrno>
 
 #include "flash_fixture.h"
-#include "stbplat/component_location.h"
-#include "stbplat/extruder.h"
 
 namespace stbplat {
 namespace test {
@@ -140,29 +138,6 @@ TEST_F(EraseTest, NorSlotErasesWholeSectorsOnly) {
   sim_.ClearHistory();
   EXPECT_TRUE(flash.EraseSlot(&config));
   EXPECT_EQ(sim_.CallCount(SimCall::kMemErase), 0);
-}
-
-TEST_F(EraseTest, ReadOnlyNorSlotReadsAndRefusesWrites) {
-  // The boot loader's partition is read-only on the box.
-  FlashInterface& flash = Flash();
-  const std::vector<uint8_t> data = Pattern(64, 8);
-  sim_.Poke("/dev/mtd1", 0x100, data);
-  sim_.SetReadOnly("/dev/mtd1");
-  std::vector<uint8_t> back(data.size());
-  EXPECT_TRUE(flash.ReadFromNORFlashAtAddr(kNorBase + 0x40100, back.data(), back.size()));
-  EXPECT_EQ(back, data);
-  ComponentLocation component;
-  component.location = MakeLocation("NOR0", "BOOT", "CONFIG");
-  component.slotOffset = 0x100;
-  Extruder in(&component, false);
-  EXPECT_TRUE(in.isInitedOK);
-  EXPECT_EQ(in.extrude(back.data(), static_cast<unsigned int>(back.size())), 0u);
-  EXPECT_EQ(back, data);
-  EXPECT_FALSE(flash.WriteToNORFlashAtAddr(kNorBase + 0x40100, data.data(), data.size()));
-  Location config = component.location;
-  EXPECT_FALSE(flash.EraseSlot(&config));  // the open for writing is refused
-  EXPECT_EQ(sim_.Bytes("/dev/mtd1", 0x100, data.size()), data);
-  EXPECT_EQ(sim_.OpenCount(), 1);
 }
 
 TEST_F(EraseTest, NorSlotEraseStopsAtTheFirstSectorThatFails) {
