@@ -15,7 +15,6 @@ static std::string SmartColumn(int column) {
                      std::to_string(column) + "}'");
 }
 
-
 SCENARIO("disk.is_dev_hdd") {
   // Only sda is an ATA (or USB) disk; the virtio disk sits on neither.
   for (std::string disk : {"sda", "vda", "sdq"}) {

@@ -103,7 +103,7 @@ SCENARIO("flash.nand_slot") {
   CHECK_EQ(Flash()->badBlocksSkipped, 1ul);
   CHECK_EQ(dev.ReadAll(2 * kBlock, kBlock), Erased(kBlock));
   CHECK_EQ(Slice(dev.GoodBlocks(), 0, length), data);
-  // The Location overloads read the bytes back across the bad block.
+  // The Location overload reads the bytes back across the bad block.
   Bytes back(length);
   Location kernelA(U("NAND0"), U("KERNEL"), U("A"));
   CHECK(NANDReadLoc(back.data(), 3 * kPage, &kernelA, 2 * kBlock - kPage));
