@@ -184,19 +184,6 @@ TEST_F(EraseTest, NandSectorErasesBlockZeroOnly) {
   EXPECT_TRUE(log.Contains("EraseNANDSlot: open of mtd partition /dev/none failed\n"));
 }
 
-TEST_F(EraseTest, EmmcSlotIsRefusedBySlotEraseAndSkippedBySectorErase) {
-  FlashInterface& flash = Flash();
-  Location store = MakeLocation("EMMC0", "APP", "STORE");
-  LogCapture log;
-  sim_.ClearHistory();
-  EXPECT_FALSE(flash.EraseSlot(&store));
-  EXPECT_TRUE(flash.EraseSector(&store));
-  EXPECT_TRUE(log.Contains(
-      "FlashInterface::EraseSlot: memory technology for EMMC0.APP.STORE is EMMC did not "
-      "erase\r\n"));
-  EXPECT_EQ(sim_.CallCount(SimCall::kAny), 0);
-}
-
 }  // namespace
 }  // namespace test
 }  // namespace stbplat
