@@ -1,8 +1,9 @@
 // Records on every stream a component location opens: NOR, a slot file,
 // physical memory, NAND (its slot starting on a bad block) and eMMC. The
-// framing leaves each stream exactly behind every entry, whatever the
-// reader consumed; where the medium takes a back-patched size (NOR, slot
-// files, memory), a record is stored in place and reads back equal.
+// bytes land where the slot and offset say; the framing leaves each stream
+// exactly behind every entry, whatever the reader consumed; where the
+// medium takes a back-patched size (NOR, slot files, memory), a record is
+// stored in place and reads back equal. And why a stream does not open.
 #include <cstring>
 #include <string>
 
@@ -28,19 +29,27 @@ struct Place {
   const char* slot;
   unsigned long offset;
   bool takesBackPatch;  // false: NAND writes pages in order, eMMC whole pages
+  const char* node;  // null: physical memory
+  unsigned long at;  // where the first byte lands in the node (or memory)
 };
 
 const Place kPlaces[] = {
-    {"NOR0", "BOOT", "CONFIG", 0x20, true}, {"FS0", "CFG", "USER", 0x10, true},
-    {"SDRAM0", "RESV", "ARGS", 0x10, true}, {"NAND0", "SYS", "DATA", 0, false},
-    {"EMMC0", "APP", "STORE", 0x800, false},
+    {"NOR0", "BOOT", "CONFIG", 0x20, true, "/dev/mtd1", 0x20},
+    {"FS0", "CFG", "USER", 0x10, true, "/data/user.cfg", 0x10},
+    {"SDRAM0", "RESV", "ARGS", 0x10, true, nullptr, kSdramBase + 0x1020},
+    {"NAND0", "SYS", "DATA", 0, false, kNandData, kNandBlock},  // block 0 is bad
+    {"EMMC0", "APP", "STORE", 0x800, false, kEmmcNode, 0x100800},
 };
 
-ComponentLocation At(const Place& place) {
+ComponentLocation At(const char* device, const char* partition, const char* slot,
+                     unsigned long offset = 0) {
   ComponentLocation component;
-  component.location = MakeLocation(place.device, place.partition, place.slot);
-  component.slotOffset = place.offset;
+  component.location = MakeLocation(device, partition, slot);
+  component.slotOffset = offset;
   return component;
+}
+ComponentLocation At(const Place& place) {
+  return At(place.device, place.partition, place.slot, place.offset);
 }
 
 void PutHeader(Bytes& bytes, const char* type, unsigned int size) {
@@ -88,6 +97,9 @@ TEST_F(RecordStreams, FramingKeepsEveryStreamBehindEachEntry) {
     SCOPED_TRACE(place.device);
     const ComponentLocation component = At(place);
     WriteRaw(component, ThreeEntries());
+    const uint8_t* memory = place.node == nullptr ? sim_.Memory(place.at) : nullptr;
+    Bytes landed = memory != nullptr ? Bytes(memory, memory + 4) : sim_.Bytes(place.node, place.at, 4);
+    EXPECT_EQ(landed, (Bytes{'V', 'E', 'R', 'S'}));
     Extruder in(&component, false);
     ASSERT_TRUE(in.isInitedOK);
     VersionEntry older, newer;
@@ -156,6 +168,31 @@ TEST_F(RecordStreams, PaddingSizedPastTheFlashIsNotSkippedByWriting) {
   FSBLInfo info;
   EXPECT_EQ(info.ReadTLVAndData(in, nullptr), 0xA012u);
   EXPECT_TRUE(sim_.Bytes("/dev/mtd1", 0, 0x40000) == before);
+}
+
+TEST_F(RecordStreams, FailuresToOpenSayWhy) {
+  // A file slot is created only by a writable stream.
+  ComponentLocation user = At("FS0", "CFG", "USER");
+  Extruder reader(&user, false);
+  EXPECT_FALSE(reader.isInitedOK);
+  ComponentLocation args = At("SDRAM0", "RESV", "ARGS");
+  sim_.FailCall(SimCall::kMmap, 1, ENOMEM);
+  LogCapture log;
+  Extruder memory(&args, false);
+  EXPECT_FALSE(memory.isInitedOK);
+  EXPECT_TRUE(log.Contains("mmap failed: errno = 12\r\n"));
+  EXPECT_EQ(memory.memFd, 0);
+  EXPECT_EQ(sim_.OpenCount(), 0);
+  const char* const messages[] = {"Device XYZ..... not found\r\n",
+                                  "Package location NOR0.BOOT.NONE not found\r\n",
+                                  "Can't find mtd partition or file name for NAND0.SYS.NONE\r\n"};
+  const ComponentLocation places[] = {At("XYZ", "A", "B"), At("NOR0", "BOOT", "NONE"),
+                                      At("NAND0", "SYS", "NONE")};
+  for (int i = 0; i < 3; ++i) {
+    Extruder in(&places[i], false);
+    EXPECT_FALSE(in.isInitedOK);
+    EXPECT_TRUE(log.Contains(messages[i]));
+  }
 }
 
 }  // namespace
