@@ -114,18 +114,6 @@ TEST_F(NandTest, UnreadableEarlierDataEndsTheWrite) {
   EXPECT_FALSE(sim_.IsBad(kNandData, 0));
 }
 
-TEST_F(NandTest, FailureAtBlockStartMarksWithoutMoving) {
-  FlashInterface& flash = Flash();
-  std::vector<uint8_t> data = Pattern(kNandPage, 4);
-  sim_.FailWritesAt(kNandData, 0);
-  sim_.ClearHistory();
-  LogCapture log;
-  ASSERT_TRUE(flash.NANDWrite(data.data(), data.size(), kDataSlot, 0));
-  EXPECT_TRUE(sim_.IsBad(kNandData, 0));
-  EXPECT_FALSE(log.Contains("moving block data"));
-  EXPECT_EQ(sim_.Bytes(kNandData, kNandBlock, kNandPage), data);
-}
-
 TEST_F(NandTest, SixthConsecutiveFailureAborts) {
   FlashInterface& flash = Flash();
   std::vector<uint8_t> data = Pattern(kNandPage, 4);

@@ -23,14 +23,9 @@ TEST_F(PartitionTableTest, NamesAreNormalisedToMemoryMapDevices) {
       "mtd7: 00040000 00010000 \"NOR0.BOOT.FSBL\"\n"
       "mtd10: 00001000 00010000 \"other name\"\n");
   FlashInterface& flash = Flash();
-  EXPECT_STREQ(flash.mtdNames[0], "NOR0....");
-  EXPECT_STREQ(flash.mtdNames[1], "NAND0...");
-  EXPECT_STREQ(flash.mtdNames[2], "NOR0.kernel");
-  EXPECT_STREQ(flash.mtdNames[3], "NOR0....");
-  EXPECT_STREQ(flash.mtdNames[4], "NAND0...");
-  EXPECT_STREQ(flash.mtdNames[5], "NAND0.rootfs");
-  EXPECT_STREQ(flash.mtdNames[6], "NOR0....");
-  EXPECT_STREQ(flash.mtdNames[7], "NOR0.BOOT.FSBL");
+  const char* const names[] = {"NOR0....", "NAND0...", "NOR0.kernel", "NOR0....",
+                               "NAND0...", "NAND0.rootfs", "NOR0....", "NOR0.BOOT.FSBL"};
+  for (int n = 0; n < 8; ++n) EXPECT_STREQ(flash.mtdNames[n], names[n]) << n;
   // The name ends at the first blank; the closing quote is not there to trim.
   EXPECT_STREQ(flash.mtdNames[10], "othe");
   EXPECT_EQ(flash.mtdSizes[10], 0x1000UL);
