@@ -16,21 +16,21 @@
 namespace stbplat {
 namespace fuzz {
 
-// Big enough for any record a fuzz input can describe; records that need
-// more fail to store, which the property treats as "cannot be stored".
+// The store buffer's size (and growth step).
 constexpr unsigned int kStoreBufferSize = 1u << 16;
 
-// Stores `record` with `store(record, intruder)` into a fresh buffer; returns
-// false when the store fails or fills the whole buffer.
+// Stores `record` with `store(record, intruder)`; returns false when the
+// store fails or does not fit the first buffer. The buffer may grow, so that
+// running out shows: the version record does not look at its sequence
+// control's status, and a fixed buffer would cut it short unnoticed. A grown
+// buffer does not hold the record's bytes either: growth resumes writing at
+// the old end of the buffer (kept on purpose), leaving a hole.
 template <typename StoreFn>
 bool StoreToBytes(StoreFn store, std::vector<unsigned char>* out) {
-  out->assign(kStoreBufferSize, 0);
-  Intruder intruder(out->data(), kStoreBufferSize);
-  // A store that fills the buffer to its last byte may have been cut short
-  // without saying so: the version record does not look at its sequence
-  // control's status.
-  if (store(intruder) != 0 || intruder.bytesLeft == 0) return false;
-  out->resize(static_cast<size_t>(intruder.pCurrent - intruder.pStart));
+  Intruder intruder(kStoreBufferSize, kStoreBufferSize);
+  intruder.growthStep = kStoreBufferSize;
+  if (store(intruder) != 0 || intruder.length != kStoreBufferSize) return false;
+  out->assign(intruder.pStart, const_cast<const unsigned char*>(intruder.pCurrent));
   return true;
 }
 
