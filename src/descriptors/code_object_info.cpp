@@ -68,7 +68,9 @@ void CodeObjectInfo::Display(unsigned char indent) const {
   DisplayIndentLine("Display", indent);
   STBPLAT_LOG(eLogModuleRecords, eLogLevelDisplay, kLogSource, "Display", "Header:\r\n");
   packageHeaderLocation.Display(nested);
-  const unsigned int shown = std::min(numComponents, kMaxComponents);
+  // A copy of the bound: binding the member itself to std::min's reference
+  // would make unoptimised builds define and export it.
+  const unsigned int shown = std::min(numComponents, unsigned{kMaxComponents});
   for (unsigned int i = 0; i < shown; ++i) {
     DisplayIndentLine("Display", indent);
     STBPLAT_LOG(eLogModuleRecords, eLogLevelDisplay, kLogSource, "Display", "Component %d:\r\n",
