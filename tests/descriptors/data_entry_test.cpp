@@ -2,10 +2,6 @@
 // chunked copies out of the source stream, display and comparison.
 #include <gtest/gtest.h>
 
-#include <cstdio>
-#include <cstdlib>
-#include <string>
-
 #include "record_test_util.h"
 #include "stbplat/data_entry.h"
 

@@ -5,12 +5,9 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <string>
 
 #include "record_test_util.h"
-#include "stbplat/bseck_reload.h"
 #include "stbplat/code_object_info.h"
-#include "stbplat/front_panel.h"
 
 namespace {
 
@@ -33,21 +30,6 @@ TEST(Location, NamesTakeTheStandardForm) {
   EXPECT_EQ(std::string(dst, dst + 4), "XYZ#") << "no terminator, nothing past the width";
   Location::ConvertToStandardFormat(U("q"), dst, 3);
   EXPECT_EQ(std::string(dst, dst + 4), "Q..#");
-}
-
-TEST(Location, CopiesPassThroughTheStandardFormAgainAndCompareByTheImport) {
-  Location raw;
-  std::memcpy(raw.deviceName, "ab\0dEFGH", 8);
-  std::memcpy(raw.partitionName, "PART....", 8);
-  std::memcpy(raw.slotName, "s1......", 8);
-  Location assigned;
-  assigned = raw;
-  for (const Location& copy : {Location(raw), assigned}) {
-    EXPECT_EQ(Name(copy.deviceName), "AB......");
-    EXPECT_EQ(Name(copy.slotName), "S1......");
-  }
-  EXPECT_TRUE(Location(U("nor0"), U("boot"), U("a")) == Location(U("NOR0"), U("BOOT"), U("A")));
-  EXPECT_FALSE(Location(U("nor0"), U("boot"), U("a")) == Location(U("NOR0"), U("BOOT"), U("B")));
 }
 
 TEST(ComponentLocation, TheOffsetArgumentIsDiscardedAndTagsCompareUpToAZeroByte) {
@@ -141,45 +123,6 @@ TEST(Display, ComponentLinesAndTheirIndentClamp) {
                                 std::string(190, ' ') + "slotName", "NOR0.BOOT.A", "\r\n", "NOR0.BOOT.A"}));
   EXPECT_EQ(log.messages()[1].format + " " + log.messages()[1].function, "%s Display");
   EXPECT_EQ(log.messages()[1].level, 4u);
-}
-
-TEST(Display, PackageHeaderIndentsWrapsAndShowsAtMostSixteenComponents) {
-  CodeObjectInfo info;
-  info.numComponents = 1;
-  LogCapture log;
-  info.Display(254);
-  const Texts lines = log.texts();
-  ASSERT_EQ(lines.size(), 2u + 5 + 2 + 5);
-  EXPECT_EQ(lines[0], std::string(99, ' '));
-  EXPECT_EQ(lines[1], "Header:\r\n");
-  EXPECT_EQ(lines[2].substr(0, 13), "componentTag ") << "254 + 2 wraps to an indent of 0";
-  EXPECT_EQ(lines[7], std::string(99, ' '));
-  EXPECT_EQ(lines[8], "Component 0:\r\n");
-  info.numComponents = 17;
-  log.Clear();
-  info.Display(0);
-  EXPECT_EQ(log.messages().size(), 2u + 5 + 16 * (2 + 5));
-}
-
-TEST(Display, ReloadErrorsInHexAndFrontPanelTextBoundedByItsLength) {
-  BseckReloadError e;
-  e.Type = 0x1A;
-  e.Error = 0xBEEF;
-  AnimatedFrontPanelDisplayEntry panel;
-  panel.text.CreateData(3, U("ABC"));
-  LogCapture log;
-  e.Display(2);
-  e.Display(255);
-  e.Display(190);
-  panel.Display(3);
-  panel.Display(200);
-  const std::string wide(199, ' ');
-  const std::string cut(190, ' ');
-  const std::string text = "AnimatedFrontPanelDisplayEntry text = ABC\r\n";
-  EXPECT_EQ(log.texts(), (Texts{"  Type                 = 0x001A\r\n", "  Error                = 0xBEEF\r\n",
-                                wide, wide, cut + "Type    ", cut + "Error   ", "   ", text,
-                                std::string(99, ' '), text}));
-  EXPECT_EQ(log.messages()[0].format, "%s");
 }
 
 }  // namespace

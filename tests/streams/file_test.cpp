@@ -4,36 +4,22 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdint>
 #include <cstdio>
-#include <fstream>
-#include <string>
-#include <vector>
 
+#include "descriptors/record_test_util.h"
 #include "flash/flash_fixture.h"
 #include "os/seam.h"
 #include "stbplat/component_location.h"
-#include "stbplat/intruder.h"
-#include "support/log_capture.h"
 
 using stbplat::os::LibcSysCalls;
 using stbplat::os::ScopedSysCalls;
 using stbplat::os::SysCalls;
 using stbplat::test::LogCapture;
-using Bytes = std::vector<unsigned char>;
-using Texts = std::vector<std::string>;
+using namespace records_test;
 
 namespace {
-
-std::string FileWith(const Bytes& bytes) {
-  char name[] = "/tmp/stbplat-stream-XXXXXX";
-  FILE* file = fdopen(mkstemp(name), "wb");
-  fwrite(bytes.data(), 1, bytes.size(), file);
-  fclose(file);
-  return name;
-}
 
 Bytes Contents(const std::string& path) {
   std::ifstream f(path, std::ios::binary);
@@ -49,7 +35,7 @@ size_t ShortWrite(const void*, size_t, size_t, FILE*) {
   return 1;
 }
 
-TEST(FileStreams, ReadsMovesCountsAndShortReads) {
+TEST(FileStreams, ReadsMovesCountsShortReadsAndDevicePaths) {
   const std::string path = FileWith({0x00, 0x2A, 0xDE, 0xAD, 0xBE, 0xEF, 1, 2, 3});
   LogCapture log;
   EXPECT_FALSE(Extruder("/nonexistent/stbplat/file", false).isInitedOK);
@@ -62,7 +48,6 @@ TEST(FileStreams, ReadsMovesCountsAndShortReads) {
   EXPECT_EQ(in.extrude(&b), 0u);
   EXPECT_EQ(b, 0xDEADBEEFu);
   EXPECT_EQ(in.count(), 3u);
-  EXPECT_EQ(in.currNandOffset, 6u);
   EXPECT_EQ(in.getP(), At(6));
   unsigned char dst[10] = {};
   unsigned int got = 99;
@@ -72,6 +57,19 @@ TEST(FileStreams, ReadsMovesCountsAndShortReads) {
   EXPECT_EQ(log.texts(), (Texts{"Unable to open file /nonexistent/stbplat/file\r\n",
                                 "Extruded less than length specified\r\n", "Can't extrude from a file\r\n"}));
   EXPECT_EQ(log.messages()[1].level, 6u);
+  Extruder device(path.c_str(), 5ul, true);  // a device path: positions are the device offset
+  EXPECT_TRUE(device.Is64Address());
+  device += 2;
+  EXPECT_EQ(device.getP(), At(7));
+  EXPECT_TRUE(device.setP(At(0x30)));
+  EXPECT_EQ(device.currNandOffset, 0x30u);
+  log.Clear();
+  EXPECT_TRUE(device.setP64(3));
+  device -= 4;
+  device -= 3;
+  EXPECT_EQ(device.getP64(), 0u);
+  EXPECT_EQ(log.texts(), (Texts{"setP64 0x3 \r\n", "Unable to go back 4 bytes, currNandOffset = 3\r\n",
+                                "getP64 0x0 \r\n"}));
   SysCalls calls = LibcSysCalls();
   calls.fseek = FailSeek;
   ScopedSysCalls guard(calls);
@@ -111,25 +109,6 @@ TEST(FileStreams, WritersAppendTruncateCreateExtendAndReportShortWrites) {
   EXPECT_EQ(log.messages()[0].function, "Intruder");
 }
 
-TEST(FileStreams, DevicePathPositionsAreTheDeviceOffset) {
-  const std::string path = FileWith({});
-  Extruder in(path.c_str(), 5ul, true);
-  EXPECT_TRUE(in.Is64Address());
-  in += 4;
-  in -= 2;
-  EXPECT_EQ(in.getP(), At(7));
-  EXPECT_TRUE(in.setP(At(0x30)));
-  EXPECT_EQ(in.currNandOffset, 0x30u);
-  LogCapture log;
-  EXPECT_TRUE(in.setP64(3));
-  in -= 4;
-  in -= 3;
-  EXPECT_EQ(in.getP64(), 0u);
-  EXPECT_EQ(log.texts(), (Texts{"setP64 0x3 \r\n", "Unable to go back 4 bytes, currNandOffset = 3\r\n",
-                                "getP64 0x0 \r\n"}));
-  std::remove(path.c_str());
-}
-
 class PhysicalMemoryStream : public stbplat::test::FlashTest {};
 
 TEST_F(PhysicalMemoryStream, ASlotTheMapDoesNotPlaceIsNotOpened) {
@@ -144,17 +123,13 @@ TEST_F(PhysicalMemoryStream, ASlotTheMapDoesNotPlaceIsNotOpened) {
 
 // Standard input: the case runs in a child whose fd 0 is a pipe fed by the
 // test, so the test process's own stdin is untouched.
-#define CHILD_CHECK(cond, code) \
-  do {                          \
-    if (!(cond)) _exit(code);   \
-  } while (0)
+#define CHILD_CHECK(cond, code) if (!(cond)) _exit(code)
 
 void StdinKeepsAHistoryToGoBackInto() {
   Bytes data(3000);
   for (size_t i = 0; i < data.size(); ++i) data[i] = static_cast<unsigned char>(i * 7 + i / 256);
-  auto be32 = [&](size_t i) {
-    return static_cast<unsigned int>(data[i] << 24 | data[i + 1] << 16 | data[i + 2] << 8 | data[i + 3]);
-  };
+  const unsigned int at2009 =
+      static_cast<unsigned int>(data[2009] << 24 | data[2010] << 16 | data[2011] << 8 | data[2012]);
   int fds[2];
   CHILD_CHECK(pipe(fds) == 0 && write(fds[1], data.data(), 3000) == 3000, 90);
   ::close(fds[1]);
@@ -175,9 +150,9 @@ void StdinKeepsAHistoryToGoBackInto() {
   in -= 2000;
   CHILD_CHECK(in.getP() == At(10) && in.extrude(&b, 1) == 0 && b == data[10], 4);
   CHILD_CHECK(in.setP(At(2009)) && in.stdinTotalRead == 2010, 5);  // a move inside the history
-  CHILD_CHECK(in.extrude(&u) == 0 && u == be32(2009), 6);           // one byte old, three new
+  CHILD_CHECK(in.extrude(&u) == 0 && u == at2009, 6);           // one byte old, three new
   in -= 4;
-  CHILD_CHECK(in.extrude(&u) == 0 && u == be32(2009), 7);  // all four from the history
+  CHILD_CHECK(in.extrude(&u) == 0 && u == at2009, 7);  // all four from the history
   in -= 2;
   CHILD_CHECK(in.extrude(buf.data(), 5, &got) == 0 && got == 5, 8);
   CHILD_CHECK(std::equal(buf.begin(), buf.begin() + 5, data.begin() + 2011), 9);
