@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "record_test_util.h"
+#include "stbplat/bseck_reload.h"
 #include "stbplat/code_object_info.h"
 
 namespace {
@@ -123,6 +124,15 @@ TEST(Display, ComponentLinesAndTheirIndentClamp) {
                                 std::string(190, ' ') + "slotName", "NOR0.BOOT.A", "\r\n", "NOR0.BOOT.A"}));
   EXPECT_EQ(log.messages()[1].format + " " + log.messages()[1].function, "%s Display");
   EXPECT_EQ(log.messages()[1].level, 4u);
+}
+
+TEST(Display, ReloadErrorsInHex) {
+  BseckReloadError e;
+  e.Type = 0x1A;
+  e.Error = 0xBEEF;
+  LogCapture log;
+  e.Display(2);
+  EXPECT_EQ(log.texts(), (Texts{"  Type                 = 0x001A\r\n", "  Error                = 0xBEEF\r\n"}));
 }
 
 }  // namespace
