@@ -184,6 +184,27 @@ TEST(MemoryConfig, GoldenLayoutsOldSizesInMiBStoredInTheCurrentOne) {
   EXPECT_EQ(many.at(13), 0);
 }
 
+// A failing controller stays in its configuration; a failing segment goes.
+TEST(MemoryConfig, AFailingControllerStaysAndAFailingSegmentGoes) {
+  Bytes controller = Golden("mcfg_minor6.bin");
+  controller = Bytes(controller.begin() + 14, controller.begin() + 14 + 8 + 0x42);
+  Bytes payload = {2, 0};
+  Append(payload, controller);
+  Append(payload, Entry("MCSD", Bytes(12, 0), 0, 6));  // not a controller
+  const Bytes bytes = Entry("MCFG", payload, 0, 6);
+  In in(bytes);
+  MemoryConfigDescriptor config;
+  EXPECT_EQ(config.ReadTLVAndData(in, nullptr), 0xA004u);
+  EXPECT_EQ(config.memoryControllers.size(), 2u);
+  controller[25] = 3;  // three segments, two present
+  In in2(controller);
+  MemoryControllerDescriptor c;
+  c.memorySegments.resize(4);
+  EXPECT_EQ(c.ReadTLVAndData(in2, nullptr), 0xA012u);
+  EXPECT_EQ(c.memorySegments.size(), 2u);
+  EXPECT_FALSE(c.valid);
+}
+
 TEST(Containers, DispatchOnNestedTypesAndSkipPaddingAndUnknownEntries) {
   FSBLInfo info;
   BuildConfig config;
