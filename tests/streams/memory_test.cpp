@@ -73,8 +73,10 @@ TEST(MemoryStreams, RefusedReadsAndWritesChangeNothingAndSayWhy) {
 }
 
 TEST(MemoryStreams, MovesStopAtTheEndOrRewindWithTheKeptCountAndNeverReadPastTheBuffer) {
-  const unsigned char bytes[8] = {0xA1, 2, 3, 4, 5, 6, 7, 8};
-  Extruder in(bytes, sizeof bytes);
+  // The stream holds the first 8 bytes; the rest lets a move past its end
+  // be asked for without leaving the array.
+  const unsigned char bytes[16] = {0xA1, 2, 3, 4, 5, 6, 7, 8};
+  Extruder in(bytes, 8);
   LogCapture log;
   in += 3;
   in += 5;  // exactly to the end
