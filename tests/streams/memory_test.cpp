@@ -146,12 +146,12 @@ TEST(MemoryStreams, GrowthTakesTheLargerOfStepAndRequestAndResumesAtTheOldEnd) {
   EXPECT_EQ(out.length, 18u) << "grown by the request, 8";
   EXPECT_EQ(Intruder(0u, 6u).length, 6u) << "the fallback size";
   unsigned char borrowed[2] = {0xA1, 0xA2};
-  Intruder grown(borrowed, 2);
+  Intruder grown(borrowed, 1);  // a one-byte buffer is copied too
   grown.growthStep = 1;
-  grown += 2;
+  grown += 1;
   EXPECT_EQ(grown.intrude(static_cast<unsigned short>(0xB1B2)), 2u);
   EXPECT_TRUE(grown.ownsBuffer);
-  EXPECT_EQ(Written(grown), (Bytes{0xA1, 0xA2, 0xB1, 0xB2}));
+  EXPECT_EQ(Written(grown), (Bytes{0xA1, 0xB1, 0xB2}));
   Intruder huge(borrowed, 2);  // a step that would take the length past 32 bits
   huge.growthStep = 0xFFFFFFFFu;
   huge += 2;
