@@ -94,8 +94,8 @@ TEST(DataEntryInPlace, FileSourceIsReachedThroughTheStream) {
   Bytes bytes = {0xEE};
   Append(bytes, Data("Z"));
   bytes.push_back(0xEE);
-  const std::string path = FileWith(bytes);
-  Extruder in(path.c_str(), true);
+  const stbplat::test::ScratchDir dir;
+  Extruder in(dir.Write("data.bin", bytes).c_str(), true);
   in += 1;
   DataEntry e;
   ASSERT_EQ(e.ReadTLVAndData(in, nullptr, true), 0u);
@@ -117,7 +117,6 @@ TEST(DataEntryInPlace, FileSourceIsReachedThroughTheStream) {
   e.length = 3;  // past the file's end: not read at all
   e.DisplayAsText();
   EXPECT_EQ(capture.texts(), (Texts{"Z\r\n", "[none]\r\n"}));
-  std::remove(path.c_str());
 }
 
 TEST(DataEntry, PayloadlessEntriesDisplayAndComparison) {
@@ -128,7 +127,6 @@ TEST(DataEntry, PayloadlessEntriesDisplayAndComparison) {
   EXPECT_EQ(header.StoreTLVAndData(&out), 0u);
   EXPECT_EQ(Written(out), (Bytes{'D', 'A', 'T', 'A', 0, 0, 0, 3}));
   EXPECT_EQ(Payload(DataEntry(header)), std::string(3, '\0'));
-  EXPECT_EQ(DataEntry(DataEntry()).GetData(), nullptr);
   LogCapture capture;
   header.DisplayAsText();
   const Bytes payloads[] = {{'A', 'B', 'C', 'D', 'E'}, {'A', 'B', 0, 'C'}, {0, 'x'}};
@@ -136,10 +134,8 @@ TEST(DataEntry, PayloadlessEntriesDisplayAndComparison) {
     DataEntry e;
     e.CreateData(static_cast<unsigned int>(payload.size()), payload.data());
     e.DisplayAsText();
-    EXPECT_EQ(Bytes(e.GetData(), e.GetData() + e.length), payload) << "left as it was";
   }
   EXPECT_EQ(capture.texts(), (Texts{"[none]\r\n", "ABCDE\r\n", "AB\r\n", " \r\n"}));
-  EXPECT_EQ(capture.messages()[0].level, 4u);
   DataEntry a;
   DataEntry b;
   EXPECT_TRUE(a == b);
@@ -147,11 +143,6 @@ TEST(DataEntry, PayloadlessEntriesDisplayAndComparison) {
   EXPECT_FALSE(b == a);
   b.CreateData(3, U("abc"));
   EXPECT_FALSE(a == b);
-  DataEntry zeros;
-  zeros.CreateData(2);
-  EXPECT_EQ(Payload(zeros), std::string(2, '\0'));
-  EXPECT_FALSE(a == zeros);
-  EXPECT_TRUE(a == DataEntry(a));
 }
 
 }  // namespace

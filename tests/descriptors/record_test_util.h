@@ -4,8 +4,6 @@
 #define STBPLAT_TESTS_DESCRIPTORS_RECORD_TEST_UTIL_H
 
 #include <algorithm>
-#include <cstdio>
-#include <cstdlib>
 #include <fstream>
 #include <iterator>
 #include <string>
@@ -16,6 +14,7 @@
 #include "stbplat/extruder.h"
 #include "stbplat/intruder.h"
 #include "support/log_capture.h"
+#include "support/scratch_dir.h"
 
 namespace records_test {
 
@@ -62,15 +61,6 @@ inline Bytes Data(const std::string& text) {
   PutU32(bytes, static_cast<unsigned int>(text.size()));
   bytes.insert(bytes.end(), text.begin(), text.end());
   return bytes;
-}
-
-// A temporary file holding bytes; the caller removes it.
-inline std::string FileWith(const Bytes& bytes) {
-  char path[] = "/tmp/stbplat-record-XXXXXX";
-  FILE* file = fdopen(mkstemp(path), "wb");
-  fwrite(bytes.data(), 1, bytes.size(), file);
-  fclose(file);
-  return path;
 }
 
 // A memory stream over bytes.

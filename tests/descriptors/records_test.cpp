@@ -224,12 +224,10 @@ TEST(Containers, DispatchOnNestedTypesAndSkipPaddingAndUnknownEntries) {
   // Padding that ends a file is skipped too.
   Bytes nested = Entry("DEVC", {0, 5, 1, 0});
   Append(nested, Skipped("PADD", 4));
-  const Bytes bytes = Fsbl(2, nested);
-  const std::string path = FileWith(bytes);
-  Extruder in(path.c_str(), true);
+  const stbplat::test::ScratchDir dir;
+  Extruder in(dir.Write("fsbl.bin", Fsbl(2, nested)).c_str(), true);
   EXPECT_EQ(info.ReadTLVAndData(in, nullptr), 0u);
   EXPECT_EQ(info.deviceConfig.scbClock, 5);
-  std::remove(path.c_str());
 }
 
 TEST(Containers, StopAtTheFirstFailingOrMissingEntry) {

@@ -5,7 +5,6 @@
 
 #include <gtest/gtest.h>
 
-#include <cstdio>
 #include <fstream>
 #include <iterator>
 #include <string>
@@ -17,6 +16,7 @@
 #include "stbplat/memory_map.h"
 #include "support/flash_sim.h"
 #include "support/log_capture.h"
+#include "support/scratch_dir.h"
 
 namespace stbplat {
 namespace test {
@@ -36,28 +36,10 @@ inline std::string DeviceMap() {
   return std::string(std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>());
 }
 
-// Writes text to a temporary file and removes it again.
-class TempFile {
- public:
-  explicit TempFile(const std::string& text) {
-    char name[] = "/tmp/stbplat-map-XXXXXX";
-    int fd = mkstemp(name);
-    path_ = name;
-    FILE* file = fdopen(fd, "w");
-    std::fputs(text.c_str(), file);
-    std::fclose(file);
-  }
-  ~TempFile() { std::remove(path_.c_str()); }
-  const std::string& path() const { return path_; }
-
- private:
-  std::string path_;
-};
-
 inline bool LoadMap(const std::string& text, std::string* error = nullptr) {
-  TempFile file(text);
+  ScratchDir dir;
   std::string ignored;
-  return ExtendedMemoryMapStructure::Load(file.path().c_str(), error ? error : &ignored);
+  return ExtendedMemoryMapStructure::Load(dir.Write("map.ini", text).c_str(), error ? error : &ignored);
 }
 
 inline Location MakeLocation(const char* device, const char* partition, const char* slot) {

@@ -128,17 +128,6 @@ TEST_F(KernelRulesTest, MarkingBadErasesTheBlockAndCountsEveryMark) {
   EXPECT_TRUE(Fails(Request(MEMERASE, 6 * kNandBlock, kNandBlock), EIO));
 }
 
-TEST_F(KernelRulesTest, PartitionsOfAChipShareItsBytesAndBadBlocks) {
-  sim_.AddPartition(6, "NAND0.SYS.LOW", kNode, 0, 4 * kNandBlock);
-  sim_.AddPartition(7, "NAND0.SYS.HIGH", kNode, 4 * kNandBlock, 4 * kNandBlock);
-  int high = Sys().open("/dev/mtd7", O_RDWR, 0);
-  ASSERT_EQ(Request(MEMSETBADBLOCK, kNandBlock, 0, high), 0);
-  Sys().close(high);
-  EXPECT_EQ(Request(MEMGETBADBLOCK, 5 * kNandBlock), 1);
-  ASSERT_EQ(WriteAt(4 * kNandBlock, Bytes(kNandPage, 0x5A)), kPage);
-  EXPECT_EQ(sim_.Bytes("/dev/mtd7", 0, 1), Bytes{0x5A});
-}
-
 TEST_F(KernelRulesTest, ReadOnlyPartitionsAndDescriptorModes) {
   sim_.SetReadOnly(kNode);
   EXPECT_TRUE(Fails(Sys().open(kNode, O_RDWR, 0), EACCES));

@@ -1,7 +1,4 @@
 // The memory-map stand-in: loading, refusing bad files, and its queries.
-#include <fstream>
-#include <sstream>
-
 #include "flash_fixture.h"
 
 namespace stbplat {
@@ -52,21 +49,6 @@ TEST_F(MemoryMapTest, PartitionNodeGivesTheSlotOffsetAsExtra) {
   unsigned long extra = 4;
   EXPECT_STREQ(Map().GetMTDorFileName(&b, &extra), "/dev/mtd5");
   EXPECT_EQ(extra, 0x20004UL);
-}
-
-TEST_F(MemoryMapTest, DocumentedExampleLoads) {
-  std::ifstream doc(std::string(STBPLAT_SOURCE_DIR) + "/docs/memory-map.md");
-  std::stringstream text;
-  text << doc.rdbuf();
-  std::string all = text.str();
-  std::size_t start = all.find("```ini\n");
-  ASSERT_NE(start, std::string::npos);
-  start += 7;
-  std::string example = all.substr(start, all.find("```", start) - start);
-  std::string error;
-  ASSERT_TRUE(LoadMap(example, &error)) << error;
-  Location user = MakeLocation("FS0", "CFG", "USER");
-  EXPECT_STREQ(Map().GetSlotFileName(&user), "/var/lib/stb/user.cfg");
 }
 
 TEST_F(MemoryMapTest, BadFilesAreRefusedNamingTheLine) {

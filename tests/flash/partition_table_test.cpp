@@ -10,41 +10,30 @@ namespace {
 
 using PartitionTableTest = FlashTest;
 
-TEST_F(PartitionTableTest, NamesAreNormalisedToMemoryMapDevices) {
+// The names become memory-map devices; the count follows the last line,
+// and rows numbered past the table are left out.
+TEST_F(PartitionTableTest, NamesAreNormalisedAndTheCountFollowsTheLastLine) {
   sim_.SetProcMtd(
       "dev:    size   erasesize  name\n"
       "mtd0: 00040000 00010000 \"NOR0\"\n"
-      "mtd1: 00040000 00010000 \"NAND0\"\n"
-      "mtd2: 00040000 00010000 \"flash0.kernel\"\n"
-      "mtd3: 00040000 00010000 \"flash0\"\n"
-      "mtd4: 00040000 00010000 \"flash1\"\n"
-      "mtd5: 00040000 00010000 \"flash1.rootfs\"\n"
-      "mtd6: 00040000 00010000 \"NOR0x\"\n"
-      "mtd7: 00040000 00010000 \"NOR0.BOOT.FSBL\"\n"
-      "mtd10: 00001000 00010000 \"other name\"\n");
-  FlashInterface& flash = Flash();
-  const char* const names[] = {"NOR0....", "NAND0...", "NOR0.kernel", "NOR0....",
-                               "NAND0...", "NAND0.rootfs", "NOR0....", "NOR0.BOOT.FSBL"};
-  for (int n = 0; n < 8; ++n) EXPECT_STREQ(flash.mtdNames[n], names[n]) << n;
-  // The name ends at the first blank; the closing quote is not there to trim.
-  EXPECT_STREQ(flash.mtdNames[10], "othe");
-  EXPECT_EQ(flash.mtdSizes[10], 0x1000UL);
-  EXPECT_EQ(flash.mtdCount, 11);
-}
-
-TEST_F(PartitionTableTest, CountFollowsTheLastLineAndHighNumbersAreIgnored) {
-  sim_.SetProcMtd(
-      "header\n"
-      "mtd12: 00002000 00010000 \"flash0.A\"\n"
-      "mtd30: 00002000 00010000 \"flash0.B\"\n"
+      "mtd1: 00040000 00010000 \"flash0.kernel\"\n"
+      "mtd2: 00040000 00010000 \"flash1\"\n"
+      "mtd3: 00040000 00010000 \"flash1.rootfs\"\n"
+      "mtd4: 00040000 00010000 \"NOR0x\"\n"
+      "mtd5: 00040000 00010000 \"NOR0.BOOT.FSBL\"\n"
+      "mtd12: 00001000 00010000 \"other name\"\n"
+      "mtd30: 00002000 00010000 \"flash0.HIGH\"\n"
       "mtd7: 00003000 00010000 \"flash0.C\"\n");
   FlashInterface& flash = Flash();
-  EXPECT_EQ(flash.mtdCount, 8);
-  EXPECT_STREQ(flash.mtdNames[12], "NOR0.A");
-  EXPECT_STREQ(flash.mtdNames[7], "NOR0.C");
+  const char* const names[] = {"NOR0....", "NOR0.kernel", "NAND0...", "NAND0.rootfs", "NOR0....",
+                               "NOR0.BOOT.FSBL", "", "NOR0.C"};
+  for (int n = 0; n < 8; ++n) EXPECT_STREQ(flash.mtdNames[n], names[n]) << n;
+  // The name ends at the first blank; the closing quote is not there to trim.
+  EXPECT_STREQ(flash.mtdNames[12], "othe");
+  EXPECT_EQ(flash.mtdSizes[12], 0x1000UL);
   EXPECT_EQ(flash.mtdSizes[7], 0x3000UL);
-  for (const auto& name : flash.mtdNames)
-    EXPECT_EQ(std::strstr(name, ".B"), nullptr);
+  EXPECT_EQ(flash.mtdCount, 8);
+  for (const auto& name : flash.mtdNames) EXPECT_EQ(std::strstr(name, "HIGH"), nullptr);
 }
 
 TEST_F(PartitionTableTest, DefaultsAndMeasuredSizes) {
@@ -156,20 +145,11 @@ TEST_F(PartitionTableTest, UpgradeModeResolvesSlotsToWholeDevices) {
   unsigned long offset = 0x10;
   EXPECT_STREQ(flash.LookupMTDPartition("NAND0.SYS.SPARE", &offset), "/dev/mtd9");
   EXPECT_EQ(offset, 0x100010UL);
-  offset = 0;
-  EXPECT_STREQ(flash.LookupMTDPartition("NOR0.BOOT.CONFIG", &offset), "/dev/mtd8");
-  EXPECT_EQ(offset, 0x40000UL);
   EXPECT_EQ(flash.LookupMTDPartition("NAND0.SYS.NONE", &offset), nullptr);
   EXPECT_TRUE(log.Contains(
       "FlashInterface::LookupMTDPartition: GetLocation failed for NAND0.SYS.NONE\r\n"));
   EXPECT_EQ(flash.LookupMTDPartition("EMMC0.APP.STORE", &offset), nullptr);
   EXPECT_TRUE(log.Contains("FlashInterface::LookupMTDPartition: unknown device type\r\n"));
-  std::memset(flash.mtdNames[9], 0, sizeof flash.mtdNames[9]);
-  EXPECT_EQ(flash.LookupMTDPartition("NAND0.SYS.DATA", &offset), nullptr);
-  EXPECT_TRUE(log.Contains("FlashInterface::LookupMTDPartition: did not find mtd entry\r\n"));
-  // The address lookup takes the fixed mapping during an upgrade.
-  EXPECT_STREQ(flash.LookupMTDPartition(kNorBase + 0x1234, &offset), "/dev/mtd8");
-  EXPECT_EQ(offset, 0x1234UL);
 }
 
 TEST_F(PartitionTableTest, AddressLookupUsesTheMemoryMapThenTheTableWalk) {

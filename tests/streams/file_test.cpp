@@ -17,14 +17,10 @@ using stbplat::os::LibcSysCalls;
 using stbplat::os::ScopedSysCalls;
 using stbplat::os::SysCalls;
 using stbplat::test::LogCapture;
+using stbplat::test::ScratchDir;
 using namespace records_test;
 
 namespace {
-
-Bytes Contents(const std::string& path) {
-  std::ifstream f(path, std::ios::binary);
-  return Bytes(std::istreambuf_iterator<char>(f), {});
-}
 
 unsigned char* At(std::uintptr_t offset) { return reinterpret_cast<unsigned char*>(offset); }
 
@@ -36,7 +32,8 @@ size_t ShortWrite(const void*, size_t, size_t, FILE*) {
 }
 
 TEST(FileStreams, ReadsMovesCountsShortReadsAndDevicePaths) {
-  const std::string path = FileWith({0x00, 0x2A, 0xDE, 0xAD, 0xBE, 0xEF, 1, 2, 3});
+  const ScratchDir dir;
+  const std::string path = dir.Write("in.bin", Bytes{0x00, 0x2A, 0xDE, 0xAD, 0xBE, 0xEF, 1, 2, 3});
   LogCapture log;
   EXPECT_FALSE(Extruder("/nonexistent/stbplat/file", false).isInitedOK);
   EXPECT_FALSE(Extruder("/nonexistent/stbplat/file", true).isInitedOK);
@@ -76,13 +73,13 @@ TEST(FileStreams, ReadsMovesCountsShortReadsAndDevicePaths) {
   EXPECT_FALSE(in.setP(At(0x180000002ul)));
   EXPECT_EQ(log.texts().back(), "Extruder::setP: fseek 0x80000002 failed\r\n");
   EXPECT_EQ(in.count(), 0u) << "a file that cannot seek tells no size";
-  std::remove(path.c_str());
 }
 
 TEST(FileStreams, WritersAppendTruncateCreateExtendAndReportShortWrites) {
-  const std::string path = FileWith({0xAA, 0xBB});
+  const ScratchDir dir;
+  const std::string path = dir.Write("out.bin", Bytes{0xAA, 0xBB});
   Intruder(path.c_str(), true).intrude(static_cast<unsigned short>(0x0102));
-  EXPECT_EQ(Contents(path), (Bytes{0xAA, 0xBB, 1, 2}));
+  EXPECT_EQ(dir.Read(path), (Bytes{0xAA, 0xBB, 1, 2}));
   {
     Intruder out(path.c_str(), false);
     EXPECT_EQ(out.intrude(static_cast<unsigned short>(0x0809)), 1u);
@@ -98,11 +95,10 @@ TEST(FileStreams, WritersAppendTruncateCreateExtendAndReportShortWrites) {
     EXPECT_EQ(log.texts(), Texts{"fwrite of 4 bytes failed, wrote 1 bytes, file location = 4, errno = 28, "
                                  "ferror = 0\r\n"});
   }
-  EXPECT_EQ(Contents(path).size(), 4u);
+  EXPECT_EQ(dir.Read(path).size(), 4u);
   std::remove(path.c_str());
   Intruder(path.c_str(), true).intrude(true);
-  EXPECT_EQ(Contents(path), Bytes{1});
-  std::remove(path.c_str());
+  EXPECT_EQ(dir.Read(path), Bytes{1});
   LogCapture log;
   EXPECT_FALSE(Intruder("/nonexistent/stbplat/out", false).isInitedOK);
   EXPECT_EQ(log.texts(), Texts{"Unable to open file /nonexistent/stbplat/out\r\n"});

@@ -11,7 +11,7 @@
 #include <string>
 #include <vector>
 
-#include "scratch_dir.h"
+#include "support/scratch_dir.h"
 #include "tool_runner.h"
 
 namespace {

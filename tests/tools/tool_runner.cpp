@@ -4,7 +4,7 @@
 
 #include <cstdlib>
 
-#include "scratch_dir.h"
+#include "support/scratch_dir.h"
 
 namespace stbplat {
 namespace test {

@@ -18,27 +18,22 @@ namespace {
 
 using stbplat::test::LogCapture;
 
-TEST(DumpBuffer, LinesOfSixteenPaddedWithDotsForTheUnprintable) {
+// Full and partial lines are the tool's hexdump rows; here the edges.
+TEST(DumpBuffer, IndentClampedNoBytesAndTheLevelGate) {
   LogCapture capture;
-  std::vector<unsigned char> bytes(17, 0xAB);
-  bytes[16] = 'z';
-  DumpBuffer(eLogModuleRecords, 0, bytes.data(), 17);
-  DumpBuffer(eLogModuleRecords, 200, bytes.data(), 1);  // the indent is clamped to 103
+  const unsigned char byte = 0xAB;
+  DumpBuffer(eLogModuleRecords, 200, &byte, 1);  // the indent is clamped to 103
   DumpBuffer(eLogModuleRecords, 4, nullptr, 5);
-  DumpBuffer(eLogModuleRecords, 4, bytes.data(), 0);
-  EXPECT_EQ(capture.texts(),
-            (std::vector<std::string>{
-                "AB AB AB AB AB AB AB AB AB AB AB AB AB AB AB AB      ................\r\n",
-                "7A " + std::string(45, ' ') + "     z" + std::string(15, ' ') + "\r\n",
-                std::string(103, ' ') + "AB " + std::string(50, ' ') + "." + std::string(15, ' ') +
-                    "\r\n",
-                "<none>\r\n", "<none>\r\n"}));
+  DumpBuffer(eLogModuleRecords, 4, &byte, 0);
+  const std::string clamped = std::string(103, ' ') + "AB " + std::string(50, ' ') + ".";
+  EXPECT_EQ(capture.texts(), (std::vector<std::string>{clamped + std::string(15, ' ') + "\r\n",
+                                                       "<none>\r\n", "<none>\r\n"}));
   EXPECT_EQ(capture.messages()[0].level, 4u);
   EXPECT_EQ(capture.messages()[0].function, "DumpBuffer");
   capture.Clear();
   capture.SetLevel(eLogModuleRecords, 3);
-  DumpBuffer(eLogModuleRecords, 0, bytes.data(), 17);
-  DumpBuffer(eLogModuleCount, 0, bytes.data(), 17);  // no level to gate it with
+  DumpBuffer(eLogModuleRecords, 0, &byte, 1);
+  DumpBuffer(eLogModuleCount, 0, &byte, 1);  // no level to gate it with
   EXPECT_TRUE(capture.messages().empty());
 }
 

@@ -1,6 +1,6 @@
 // A temporary directory for one test, removed with everything in it.
-#ifndef STBPLAT_TESTS_TOOLS_SCRATCH_DIR_H
-#define STBPLAT_TESTS_TOOLS_SCRATCH_DIR_H
+#ifndef STBPLAT_TESTS_SUPPORT_SCRATCH_DIR_H
+#define STBPLAT_TESTS_SUPPORT_SCRATCH_DIR_H
 
 #include <string>
 #include <vector>
