@@ -215,7 +215,8 @@ void* SimMmap(void*, size_t length, int protection, int flags, int fd, off64_t o
 }
 int SimMunmap(void* address, size_t length) {
   FlashSim* sim = FlashSim::Current();
-  return sim->PassesThrough() && !sim->IsEmulatedMemory(address) ? Libc().munmap(address, length) : 0;
+  if (sim->PassesThrough() && !sim->IsEmulatedMemory(address)) return Libc().munmap(address, length);
+  return sim->Unmap(address, length);
 }
 int SimPageSize();
 ssize_t SimReadlink(const char* path, char* buffer, size_t size) {
@@ -391,21 +392,24 @@ void FlashSim::Alias(const std::string& alias, const std::string& target) {
 bool FlashSim::HasFile(const std::string& path) const { return Find(path) != nullptr; }
 
 void FlashSim::AddMemory(uint64_t physBase, uint64_t size) {
-  memory_.push_back(Region{physBase, std::vector<uint8_t>(size, 0)});
+  Region region{physBase, size, std::vector<uint8_t>(size + kPageSize, 0), nullptr};
+  const auto at = reinterpret_cast<uintptr_t>(region.storage.data());
+  region.bytes = region.storage.data() + (kPageSize - at % kPageSize) % kPageSize;
+  memory_.push_back(std::move(region));
 }
 
 bool FlashSim::IsEmulatedMemory(const void* address) const {
   for (const Region& region : memory_) {
     const uint8_t* at = static_cast<const uint8_t*>(address);
-    if (at >= region.bytes.data() && at < region.bytes.data() + region.bytes.size()) return true;
+    if (at >= region.bytes && at < region.bytes + region.size) return true;
   }
   return false;
 }
 
 uint8_t* FlashSim::Memory(uint64_t physAddress) {
   for (Region& region : memory_)
-    if (physAddress >= region.base && physAddress - region.base < region.bytes.size())
-      return region.bytes.data() + (physAddress - region.base);
+    if (physAddress >= region.base && physAddress - region.base < region.size)
+      return region.bytes + (physAddress - region.base);
   return nullptr;
 }
 
@@ -650,12 +654,32 @@ void* FlashSim::Map(size_t length, int protection, int flags, int fd, off64_t of
     return MAP_FAILED;
   }
   uint64_t start = static_cast<uint64_t>(offset);
+  if (start % kPageSize != 0) {  // the kernel maps whole pages only
+    errno = EINVAL;
+    return MAP_FAILED;
+  }
   for (Region& region : memory_) {
-    if (start >= region.base && start - region.base + length <= region.bytes.size())
-      return region.bytes.data() + (start - region.base);
+    if (start < region.base || start - region.base + length > region.size) continue;
+    uint8_t* mapped = region.bytes + (start - region.base);
+    mappings_.emplace(mapped, length);
+    return mapped;
   }
   errno = EINVAL;
   return MAP_FAILED;
+}
+
+// An unmap must name a mapping's start and its length in pages: anything
+// else leaves part of it mapped, or unmaps what is not the stream's.
+int FlashSim::Unmap(void* address, size_t length) {
+  auto pages = [](size_t bytes) { return (bytes + kPageSize - 1) / kPageSize; };
+  auto range = mappings_.equal_range(address);
+  for (auto it = range.first; it != range.second; ++it) {
+    if (pages(it->second) != pages(length)) continue;
+    mappings_.erase(it);
+    return 0;
+  }
+  errno = EINVAL;
+  return -1;
 }
 
 int FlashSim::Unlink(const char* path) {

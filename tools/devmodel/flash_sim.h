@@ -96,8 +96,9 @@ class FlashSim {
 
   // Descriptors and FILE streams currently open.
   int OpenCount() const;
-  void SetPageSize(int size) { pageSize_ = size; }
-  int PageSize() const { return pageSize_; }
+  // Mappings of physical memory not yet unmapped.
+  int MappingCount() const { return static_cast<int>(mappings_.size()); }
+  int PageSize() const { return kPageSize; }
   // Descriptors are the lowest free number from this one on, as the kernel
   // hands them out (0 lets a test see a descriptor 0).
   void SetFirstDescriptor(int fd) { firstFd_ = fd; }
@@ -124,6 +125,7 @@ class FlashSim {
   int Ioctl(int fd, unsigned long request, void* argument);
   void* Map(size_t length, int protection, int flags, int fd, off64_t offset);
   bool IsEmulatedMemory(const void* address) const;
+  int Unmap(void* address, size_t length);
   bool PassesThrough() const { return static_cast<bool>(hostPath_); }
   std::string HostPath(const char* path) const;
   int Unlink(const char* path);
@@ -147,14 +149,19 @@ class FlashSim {
   std::string procOverride_;
   bool hasOverride_ = false;
   bool procRemoved_ = false;
+  // Physical memory, page-aligned in this process as a kernel mapping is,
+  // so that a stream's page arithmetic is checked.
   struct Region {
     uint64_t base;
-    std::vector<uint8_t> bytes;
+    uint64_t size;
+    std::vector<uint8_t> storage;  // a page more than size
+    uint8_t* bytes;                // the first page boundary in storage
   };
+  static constexpr int kPageSize = 4096;
   std::vector<Region> memory_;
+  std::multimap<const void*, size_t> mappings_;  // start, length
   int firstFd_ = 3;
   int openFiles_ = 0;
-  int pageSize_ = 4096;
   std::function<std::string(const char*)> hostPath_;
   FlashSim* previous_;
 };
