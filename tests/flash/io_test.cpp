@@ -147,10 +147,13 @@ TEST_F(NorTest, UnknownAddressFallsBackToTheWholeChip) {
   // TINY holds this address but has no partition of its own: the table walk
   // finds it in the whole-chip row, without a warning.
   EXPECT_TRUE(flash.WriteToNORFlashAtAddr(kNorBase + 0x80000 + 0x10, data, 4));
+  EXPECT_TRUE(flash.ReadFromNORFlashAtAddr(kNorBase + 0x80000 + 0x10, data, 4));
+  EXPECT_FALSE(flash.ReadFromNORFlashAtAddr(kNorBase + 0x500000, data, 4));
   EXPECT_FALSE(log.Contains("0xE0080010"));
   EXPECT_EQ(sim_.Bytes("/dev/mtd8", 0x80010, 4), std::vector<uint8_t>(data, data + 4));
   EXPECT_TRUE(log.Contains(
       "WriteToNORFlashAtAddr: mtd name for address 0xE0500000 not found, using /dev/mtd0\r\n"));
+  EXPECT_TRUE(log.Contains("ReadFromNORFlashAtAddr: mtd name for address 0xE0500000 not found"));
   EXPECT_EQ(log.messages()[0].level, 3u);
   EXPECT_FALSE(flash.WriteToNORFlashAtAddr(kNorBase, nullptr, 4));
   EXPECT_TRUE(log.Contains("pBuffer is NULL\r\n"));

@@ -58,6 +58,11 @@ TEST_F(NandTest, ContinuedWriteCompletesTheBufferedPage) {
   EXPECT_EQ(sim_.Writes(kNandData).back(), Span(3 * kNandPage, kNandPage));  // the whole last page
   flash.NANDFlushWrite();  // nothing buffered: nothing happens
   EXPECT_EQ(sim_.Writes(kNandData).size(), 3u);
+  // A short write that exactly fills the buffered page sends it at once.
+  ASSERT_TRUE(flash.NANDWrite(data.data(), 1500, kDataSlot, 4 * kNandPage));
+  ASSERT_TRUE(flash.NANDWrite(data.data() + 1500, kNandPage - 1500, kDataSlot, 4 * kNandPage + 1500));
+  EXPECT_EQ(sim_.Writes(kNandData).back(), Span(4 * kNandPage, kNandPage));
+  EXPECT_EQ(flash.currNANDBufferOffset, 0UL);
 }
 
 TEST_F(NandTest, MisalignedWritesAreRefused) {
@@ -112,6 +117,17 @@ TEST_F(NandTest, UnreadableEarlierDataEndsTheWrite) {
   EXPECT_TRUE(log.Contains(
       "HandleBadNANDBlock: unable to read bad block at offset 0x00000000, size = 0x00001000\r\n"));
   EXPECT_FALSE(sim_.IsBad(kNandData, 0));
+}
+
+TEST_F(NandTest, NoBlockAfterTheLastToMoveTo) {
+  FlashInterface& flash = Flash();
+  std::vector<uint8_t> data = Pattern(2 * kNandPage, 5);
+  const unsigned long last = kNandSize - kNandBlock;
+  ASSERT_TRUE(flash.NANDWrite(data.data(), kNandPage, kDataSlot, last));
+  sim_.FailWritesAt(kNandData, last + kNandPage);
+  LogCapture log;
+  EXPECT_FALSE(flash.NANDWrite(data.data() + kNandPage, kNandPage, kDataSlot, last + kNandPage));
+  EXPECT_TRUE(log.Contains("FlashInterface::NANDWrite: unable to find a good block\r\n"));
 }
 
 TEST_F(NandTest, SixthConsecutiveFailureAborts) {

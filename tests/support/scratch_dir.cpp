@@ -10,7 +10,7 @@ namespace test {
 
 namespace fs = std::filesystem;
 
-ScratchDir::ScratchDir() : path_((fs::temp_directory_path() / "stbplat-tool-XXXXXX").string()) {
+ScratchDir::ScratchDir() : path_((fs::temp_directory_path() / "stbplat-test-XXXXXX").string()) {
   if (mkdtemp(&path_[0]) == nullptr) throw fs::filesystem_error("mkdtemp", path_, std::error_code());
 }
 
