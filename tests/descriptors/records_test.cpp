@@ -117,7 +117,9 @@ TEST(Records, GoldenRecordsStoreBackByteForByteAndFreshOnesTheirDefaults) {
   PutU32(vers, 0x40000000);
   PutU32(vers, 0);
   EXPECT_EQ(Stored(VersionEntry()), Entry("VERS", vers, 0, 2));
-  EXPECT_EQ(Stored(BseckReloadDescriptor()), Entry("BSCK", {0, 0, 0, 0}));
+  BseckReloadDescriptor oneError;
+  oneError.ReloadErrors.resize(1);
+  EXPECT_EQ(Stored(oneError), Entry("BSCK", {0, 0, 0, 1, 0, 0, 0, 0, 0, 0, 0, 0}));
   EXPECT_EQ(Stored(AnimatedFrontPanelDisplayEntry()), Entry("AFPD", Data("")));
   EXPECT_EQ(Stored(MemoryConfigDescriptor()), Entry("MCFG", {0, 0}, 0, 6));
   EXPECT_EQ(Stored(MemoryControllerDescriptor()), Entry("MCET", Bytes(14, 0), 0, 6));
@@ -125,7 +127,8 @@ TEST(Records, GoldenRecordsStoreBackByteForByteAndFreshOnesTheirDefaults) {
   const BuildConfig config;
   EXPECT_EQ(std::tie(config.componentVerLetter, config.unused1, config.numDescriptors),
             std::make_tuple(0, 0u, 0u));
-  EXPECT_EQ(Text(config.componentTag, 4), std::string(4, '\0'));
+  EXPECT_EQ(Text(config.componentTag, 4) + Text(config.componentMajorVer, 2) + Text(config.componentMinorVer, 2),
+            std::string(8, '\0'));
   EXPECT_EQ(BuildEnvironmentDescriptor().flags, 0);
   // The read-only records store nothing.
   Intruder out(64u, 0u);

@@ -247,6 +247,7 @@ TEST(GetHdTemperature, NoDiskOrNoReading) {
   FakeSystem sys;
   int temperature = 99;
   LogCapture log;
+  EXPECT_FALSE(GetHdTemperature(nullptr));
   EXPECT_FALSE(GetHdTemperature(&temperature));
   EXPECT_EQ(temperature, 99);
   sys.links["sda"] = kAtaLink;

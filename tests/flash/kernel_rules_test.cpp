@@ -100,22 +100,6 @@ TEST_F(KernelRulesTest, EraseRegions) {
   EXPECT_EQ(sim_.Bytes(kNode, 6 * kNandBlock, kNandPage), Pattern(kNandPage, 1));
 }
 
-TEST_F(KernelRulesTest, UnreadablePageCountsEveryEccStepAndReadsGarbage) {
-  Bytes page = Pattern(kNandPage, 6);
-  ASSERT_EQ(WriteAt(10 * kNandPage, page), kPage);
-  sim_.AddEccFailure(kNode, 10 * kNandPage + 100);
-  Bytes got(kNandPage);
-  EXPECT_EQ(ReadAt(10 * kNandPage, got), kPage);
-  EXPECT_EQ(Stats().failed, 8u);  // 2 KiB in 256-byte steps
-  for (size_t i = 0; i < got.size(); ++i) ASSERT_NE(got[i], page[i]) << i;
-  // A few bytes of the page cost the whole page; its neighbour is clean.
-  Bytes few(4);
-  EXPECT_EQ(ReadAt(10 * kNandPage + 2000, few), 4);
-  ASSERT_EQ(ReadAt(11 * kNandPage, got), kPage);
-  EXPECT_EQ(Stats().failed, 16u);
-  EXPECT_EQ(got, Bytes(kNandPage, 0xFF));
-}
-
 TEST_F(KernelRulesTest, MarkingBadErasesTheBlockAndCountsEveryMark) {
   sim_.MarkBad(kNode, 4 * kNandBlock);  // from the factory: counted once
   sim_.MarkBad(kNode, 4 * kNandBlock);
