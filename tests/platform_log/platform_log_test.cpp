@@ -10,12 +10,13 @@
 namespace {
 
 TEST(PlatformLog, LevelsFollowTheEnvironment) {
+  const char* expected = std::getenv("EXPECTED_LEVELS");
+  if (expected == nullptr) GTEST_SKIP() << "ctest runs it with each STBPLAT_LOG_LEVEL and the levels it gives";
   std::string levels;
   for (int m : {0, 2, 3, 11, 18, 31})
     levels += (levels.empty() ? "" : ",") + std::to_string(m) + "=" +
               std::to_string(subSystemLogLevel[m]);
-  const char* expected = std::getenv("EXPECTED_LEVELS");
-  EXPECT_EQ(levels, expected != nullptr ? expected : "");
+  EXPECT_EQ(levels, expected);
 }
 
 TEST(PlatformLog, WritesPrefixAndMessageToStandardError) {
