@@ -10,8 +10,6 @@ namespace {
 using namespace records_test;
 using stbplat::test::LogCapture;
 
-const unsigned char* U(const char* s) { return reinterpret_cast<const unsigned char*>(s); }
-
 std::string Payload(const DataEntry& e) { return Text(e.GetData(), e.length); }
 
 TEST(DataEntryRead, OwnedBorrowedAndEmptyPayloads) {

@@ -15,7 +15,6 @@ namespace {
 using namespace records_test;
 using stbplat::test::LogCapture;
 
-const unsigned char* U(const char* s) { return reinterpret_cast<const unsigned char*>(s); }
 std::string Name(const unsigned char* n) { return std::string(reinterpret_cast<const char*>(n), 8); }
 
 TEST(Location, NamesTakeTheStandardForm) {
@@ -47,22 +46,6 @@ TEST(ComponentLocation, TheOffsetArgumentIsDiscardedAndTagsCompareUpToAZeroByte)
   b.slotOffset = 0;
   b.location = Location(U("nor"), U("boot"), U("b"));
   EXPECT_FALSE(a == b);
-}
-
-void Put(Bytes& out, const std::string& tag, const std::string& names, unsigned long offset) {
-  out.insert(out.end(), tag.begin(), tag.end());
-  out.insert(out.end(), names.begin(), names.end());
-  for (int shift = 56; shift >= 0; shift -= 8) out.push_back(static_cast<unsigned char>(offset >> shift));
-}
-
-// A package header with two components, laid out by hand from the wire form.
-Bytes PackageHeaderWire(unsigned char count) {
-  Bytes out = {0x01, 0x02};
-  Put(out, "PKGH", "NOR0....BOOT....A.......", 0x40);
-  Append(out, {0, 0, 0, count});
-  Put(out, "KRNL", "NAND0...KERNEL..A.......", 0x800);
-  Put(out, "ROOT", "emmc....ROOTFS..B.......", 0x123456789ul);
-  return out;
 }
 
 TEST(CodeObjectInfo, HandWrittenHeaderReadsFieldByFieldAndStoresInStandardForm) {

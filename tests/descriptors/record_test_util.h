@@ -63,6 +63,24 @@ inline Bytes Data(const std::string& text) {
   return bytes;
 }
 
+inline const unsigned char* U(const char* s) { return reinterpret_cast<const unsigned char*>(s); }
+
+inline void Put(Bytes& out, const std::string& tag, const std::string& names, unsigned long offset) {
+  out.insert(out.end(), tag.begin(), tag.end());
+  out.insert(out.end(), names.begin(), names.end());
+  for (int shift = 56; shift >= 0; shift -= 8) out.push_back(static_cast<unsigned char>(offset >> shift));
+}
+
+// A package header with two components, laid out by hand from the wire form.
+inline Bytes PackageHeaderWire(unsigned char count) {
+  Bytes out = {0x01, 0x02};
+  Put(out, "PKGH", "NOR0....BOOT....A.......", 0x40);
+  Append(out, {0, 0, 0, count});
+  Put(out, "KRNL", "NAND0...KERNEL..A.......", 0x800);
+  Put(out, "ROOT", "emmc....ROOTFS..B.......", 0x123456789ul);
+  return out;
+}
+
 // A memory stream over bytes.
 struct In : Extruder {
   explicit In(const Bytes& bytes, size_t keep = ~size_t{0})

@@ -45,13 +45,6 @@ Bytes RoundTrip(const Bytes& golden) {
   return Stored(record);
 }
 
-// A package header with two components, all names and offsets zero.
-Bytes PackageHeader() {
-  Bytes bytes(2 + 36 + 4 + 2 * 36, 0);
-  bytes[2 + 36 + 3] = 2;
-  return bytes;
-}
-
 template <class R>
 unsigned int ReadRecord(R& record, Extruder& in) {
   if constexpr (std::is_base_of_v<SystemDescriptor, R>)
@@ -301,7 +294,7 @@ TEST(RecordMessages, StreamsAndBuffersEndingInsideEachField) {
   const Bytes bldc = Golden("build_config.bin");
   const Bytes afpd = Golden("afpd.bin");
   const Bytes devc = Entry("DEVC", {0, 5, 1, 0});
-  const Bytes pkg = PackageHeader();
+  const Bytes pkg = PackageHeaderWire(2);
   Bytes fsbl = Golden("vers_no_tail.bin");
   PutU32(fsbl, 5);
   Append(fsbl, devc);
@@ -325,7 +318,6 @@ TEST(RecordMessages, StreamsAndBuffersEndingInsideEachField) {
        "nvSequence"},
       {ReadCut<BseckReloadDescriptor>, bsck, 12, 0, {0xA012, 0}, in,
        "ExecutingType|numReloadError|flags|ReloadErrors|majorVer|minorVer|Type|Error"},
-      {ReadCut<DeviceConfigDescriptor>, devc, 12, 0, {0xA012, 0}, in, "scbClock|avsEnabled|reserved"},
       {ReadCut<MemoryConfigDescriptor>, mcfg, 12, 64, {0xA012}, in,
        "numControllers|reserved|storedEntryType|memoryControllers|entrySize|localFlags|localMajorVer|"
        "minorVer|ddrCfgWidth|ddrSize|ddrSpeed|ddrDevTech|ddrMode|ddrDevWidth|numSegments|memorySegments|"

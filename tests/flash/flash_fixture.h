@@ -48,6 +48,9 @@ inline Location MakeLocation(const char* device, const char* partition, const ch
                   reinterpret_cast<const unsigned char*>(slot));
 }
 
+// A transfer or erase the simulator saw: offset, length.
+using Span = std::pair<uint64_t, uint64_t>;
+
 inline std::vector<uint8_t> Pattern(size_t length, uint8_t seed) {
   std::vector<uint8_t> bytes(length);
   for (size_t i = 0; i < length; ++i) bytes[i] = static_cast<uint8_t>(seed + i * 7 + (i >> 8));

@@ -9,7 +9,6 @@ namespace stbplat {
 namespace test {
 namespace {
 
-using Span = std::pair<uint64_t, uint64_t>;
 using DeviceIoTest = FlashTest;
 
 TEST_F(DeviceIoTest, EccFailureDuringReadRejectsFilledBuffer) {

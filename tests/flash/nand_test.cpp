@@ -8,7 +8,6 @@ namespace stbplat {
 namespace test {
 namespace {
 
-using Span = std::pair<uint64_t, uint64_t>;
 constexpr const char* kDataSlot = "NAND0.SYS.DATA";
 
 using NandTest = FlashTest;
@@ -70,8 +69,6 @@ TEST_F(NandTest, MisalignedWritesAreRefused) {
   LogCapture log;
   std::vector<uint8_t> data = Pattern(100, 1);
   EXPECT_FALSE(flash.NANDWrite(data.data(), 10, kDataSlot, 5));
-  EXPECT_TRUE(log.Contains(
-      "NANDWrite: writing in the middle of a block and currNANDBufferOffset == 0\r\n"));
   ASSERT_TRUE(flash.NANDWrite(data.data(), 100, kDataSlot, 0));
   EXPECT_FALSE(flash.NANDWrite(data.data(), 10, kDataSlot, 40));
   EXPECT_TRUE(log.Contains(
@@ -102,7 +99,6 @@ TEST_F(NandTest, FailedWriteMovesEarlierDataToTheNextGoodBlock) {
   EXPECT_EQ(back, data);
   EXPECT_TRUE(log.Contains("HandleBadNANDBlock: moving block data (4096 bytes) to next block\r\n"));
   EXPECT_TRUE(log.Contains("HandleBadNANDBlock: Skipping a bad block at offset 0x00020000\r\n"));
-  EXPECT_TRUE(log.Contains("HandleBadNANDBlock: marking block at offset 0x00000000 as bad\r\n"));
   EXPECT_EQ(sim_.OpenCount(), 0);
 }
 

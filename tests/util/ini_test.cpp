@@ -3,11 +3,11 @@
 #include <unistd.h>
 
 #include <cstdio>
-#include <fstream>
 #include <string>
 
 #include "stbplat/ini_reader.h"
 #include "support/ini_recorder.h"
+#include "support/scratch_dir.h"
 #include "util/ini_core.h"
 
 namespace {
@@ -58,8 +58,8 @@ TEST(IniParse, LinesSectionsCommentsAndErrors) {
 }
 
 TEST(INIReader, OwnCopyOfTheNameDirectiveHandlerAndMissingFiles) {
-  const std::string path = testing::TempDir() + "stbplat-reader.ini";
-  std::ofstream(path) << ":refused\n[s]\nk = v\n";
+  const stbplat::test::ScratchDir dir;
+  const std::string path = dir.Write("reader.ini", ":refused\n[s]\nk = v\n");
   std::string name = path;
   IniRecorder recorder;
   INIReader reader(name.c_str(), IniRecorder::OnValue, &recorder);
