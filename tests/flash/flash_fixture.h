@@ -76,6 +76,7 @@ class FlashTest : public ::testing::Test {
     ASSERT_TRUE(LoadMap(DeviceMap()));
   }
   void TearDown() override {
+    EXPECT_EQ(sim_.OpenCount(), 0) << "descriptors or streams left open";
     EXPECT_EQ(sim_.MappingCount(), 0) << "physical memory left mapped";
     flash::ResetFlashInterfaceForTest();
     ExtendedMemoryMapStructure::Reset();

@@ -56,7 +56,6 @@ TEST_F(PartitionTableTest, DefaultsAndMeasuredSizes) {
     EXPECT_EQ(message.module, eLogModuleFlashAccess);
     EXPECT_EQ(message.sourceFile, "../FlashInterface");
   }
-  EXPECT_EQ(sim_.OpenCount(), 0);
 }
 
 TEST_F(PartitionTableTest, NoProcMtdLeavesTheTableEmptyAndDefaultsStand) {
