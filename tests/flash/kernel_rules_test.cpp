@@ -78,16 +78,6 @@ TEST_F(KernelRulesTest, WritesClearBitsLandInBadBlocksAndAreCutAtTheEnd) {
   EXPECT_TRUE(Fails(Sys().lseek64(fd_, static_cast<off64_t>(kSize + kNandPage), SEEK_SET), EINVAL));
 }
 
-TEST_F(KernelRulesTest, WeakPageFailsAfterProgrammingUpToItself) {
-  sim_.FailWritesAt(kNode, kNandBlock + 5 * kNandPage + 7);
-  Bytes data = Pattern(8 * kNandPage, 5);
-  EXPECT_TRUE(Fails(WriteAt(kNandBlock, data), EIO));
-  EXPECT_EQ(Sys().lseek64(fd_, 0, SEEK_CUR), static_cast<off64_t>(kNandBlock));
-  Bytes back = sim_.Bytes(kNode, kNandBlock, data.size());
-  EXPECT_TRUE(std::equal(data.begin(), data.begin() + 6 * kNandPage, back.begin()));
-  EXPECT_EQ(Bytes(back.begin() + 6 * kNandPage, back.end()), Bytes(2 * kNandPage, 0xFF));
-}
-
 TEST_F(KernelRulesTest, EraseRegions) {
   EXPECT_EQ(Request(MEMERASE, 100, 0), 0);  // nothing to erase, so nothing to align
   EXPECT_TRUE(Fails(Request(MEMERASE, kSize, 0), EINVAL));
