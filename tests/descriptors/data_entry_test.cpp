@@ -114,6 +114,7 @@ TEST(DataEntryInPlace, FileSourceIsReachedThroughTheStream) {
   e.DisplayAsText();
   e.length = 3;  // past the file's end: not read at all
   e.DisplayAsText();
+  EXPECT_FALSE(e == e) << "a payload that cannot be read equals nothing";
   EXPECT_EQ(capture.texts(), (Texts{"Z\r\n", "[none]\r\n"}));
 }
 

@@ -64,6 +64,10 @@ TEST(CodeObjectInfo, HandWrittenHeaderReadsFieldByFieldAndStoresInStandardForm) 
   std::memcpy(wire.data() + 2 + 36 + 4 + 36 + 4, "EMMC", 4);
   EXPECT_EQ(Written(out), wire) << "names go out in standard form";
   EXPECT_EQ(Name(root.location.deviceName), "emmc....") << "the record itself is left as it was";
+  LogCapture log;
+  info.Display(0);
+  EXPECT_TRUE(log.Contains("Component 1:\r\n"));
+  EXPECT_FALSE(log.Contains("Component 2:")) << "two components, two shown";
   CodeObjectInfo empty;
   Intruder none(64u, 0u);
   EXPECT_EQ(empty.Store(&none), 0u);

@@ -129,12 +129,7 @@ SCENARIO("flash.nand_partial_page") {
   Flash()->NANDFlushWrite();
   CHECK_EQ(Flash()->currNANDBufferOffset, 0ul);
   CHECK_EQ(dev.ReadAll(kPage, 1052), Slice(data, kPage, 1052));
-  // Flushing an empty buffer writes nothing.
-  Flash()->NANDFlushWrite();
   CHECK_EQ(dev.ReadAll(2 * kPage, kPage), Erased(kPage));
-  // A write that starts inside a page with nothing buffered is refused.
-  CHECK(!Flash()->NANDWrite(data.data(), 10, "NAND0.KERNEL.A", 2 * kPage + 10));
-  CHECK_LOG("NANDWrite: writing in the middle of a block and currNANDBufferOffset == 0\r\n");
 }
 
 // mtd-utils and the library agree on data, bad blocks and the erased state
