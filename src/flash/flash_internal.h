@@ -24,6 +24,7 @@ constexpr unsigned long kDefaultEmmcChunkSize = 0x80000;
 constexpr unsigned long kDefaultSpareSectorSize = 0x20000;
 constexpr unsigned long kDefaultNandSectorSize = 0x80000;
 constexpr unsigned long kDefaultNandPageSize = 2048;
+constexpr unsigned char kErasedFlashByte = 0xFF;
 // A chunk that keeps failing to write is retried this many times in a row
 // before the block is given up as unusable.
 constexpr int kMaxNandWriteFailures = 5;

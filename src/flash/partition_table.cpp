@@ -117,8 +117,11 @@ void MeasureNorSectorSize(FlashInterface& self) {
   if (GetInfo(fd.get(), &info) && info.erasesize != 0) self.norSectorSize = info.erasesize;
 }
 
+// A flush writes the whole page, the unused tail of the buffer included: the
+// first one sends erased bytes there, not whatever the heap held.
 void AllocatePageBuffer(FlashInterface& self) {
   self.nandPageBuffer = new (std::nothrow) unsigned char[self.nandPageSize];
+  if (self.nandPageBuffer != nullptr) std::memset(self.nandPageBuffer, kErasedFlashByte, self.nandPageSize);
 }
 
 // The first NAND slot whose partition opens decides the NAND geometry.

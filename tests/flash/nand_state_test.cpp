@@ -22,12 +22,12 @@ using NandState = FlashTest;
 TEST_F(NandState, PendingPageStaysWithItsDeviceAndPage) {
   FlashInterface& flash = Flash();
   const std::vector<uint8_t> pending = Pattern(100, 1), pages = Pattern(2 * kNandPage, 2);
-  ASSERT_TRUE(flash.NANDWrite(pending.data(), pending.size(), kDataSlot, 0));
+  ASSERT_TRUE(flash.NANDWrite(pending.data(), 1, kDataSlot, 0));
   // Whole pages elsewhere on the device come from the caller, not from the
   // one-page buffer, which is written out at its own place first.
   ASSERT_TRUE(flash.NANDWrite(pages.data(), pages.size(), kDataSlot, 4 * kNandPage));
   EXPECT_EQ(sim_.Bytes(kNandData, 4 * kNandPage, pages.size()), pages);
-  EXPECT_EQ(sim_.Bytes(kNandData, 0, pending.size()), pending);
+  EXPECT_EQ(sim_.Bytes(kNandData, 0, 2), (std::vector<uint8_t>{pending[0], 0xFF}));
   EXPECT_EQ(flash.currNANDBufferOffset, 0UL);
   // Another device never receives the buffered bytes: they go to their own.
   ASSERT_TRUE(flash.NANDWrite(pending.data(), pending.size(), kDataSlot, 8 * kNandPage));
