@@ -90,36 +90,32 @@ TEST(CodeObjectInfo, CountsTheRecordCannotHoldOrTheStreamEndsBefore) {
   EXPECT_EQ(out.pCurrent, out.pStart);
 }
 
-TEST(Display, ComponentLinesAndTheirIndentClamp) {
+TEST(Display, ComponentAndReloadErrorLinesAndTheirIndentClamp) {
   ComponentLocationStorage c;
   c.location = Location(U("nor0"), U("boot"), U("a"));
   std::memcpy(c.componentTag, "BOOT", 4);
   c.slotOffset = 0xABCDEFul;
+  BseckReloadError e;
+  e.Type = 0x1A;
+  e.Error = 0xBEEF;
   LogCapture log;
+  e.Display(2);
   c.Display(4);
   c.location.Display(250);
   c.location.Display(190);
   c.location.DisplayCompact(true);
   c.location.DisplayCompact(false);
   const std::string wide(199, ' ');
-  EXPECT_EQ(log.texts(), (Texts{"    componentTag         = BOOT\r\n",
+  EXPECT_EQ(log.texts(), (Texts{"  Type                 = 0x001A\r\n", "  Error                = 0xBEEF\r\n",
+                                "    componentTag         = BOOT\r\n",
                                 "    deviceName           = NOR0....\r\n",
                                 "    partitionName        = BOOT....\r\n",
                                 "    slotName             = A.......\r\n",
                                 "    slotOffset           = 0xABCDEF\r\n", wide, wide, wide,
                                 std::string(190, ' ') + "deviceNa", std::string(190, ' ') + "partitio",
                                 std::string(190, ' ') + "slotName", "NOR0.BOOT.A", "\r\n", "NOR0.BOOT.A"}));
-  EXPECT_EQ(log.messages()[1].format + " " + log.messages()[1].function, "%s Display");
-  EXPECT_EQ(log.messages()[1].level, 4u);
-}
-
-TEST(Display, ReloadErrorsInHex) {
-  BseckReloadError e;
-  e.Type = 0x1A;
-  e.Error = 0xBEEF;
-  LogCapture log;
-  e.Display(2);
-  EXPECT_EQ(log.texts(), (Texts{"  Type                 = 0x001A\r\n", "  Error                = 0xBEEF\r\n"}));
+  EXPECT_EQ(log.messages()[3].format + " " + log.messages()[3].function, "%s Display");
+  EXPECT_EQ(log.messages()[3].level, 4u);
 }
 
 }  // namespace

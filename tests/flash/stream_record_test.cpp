@@ -171,6 +171,7 @@ TEST_F(RecordStreams, PaddingSizedPastTheFlashIsNotSkippedByWriting) {
 }
 
 TEST_F(RecordStreams, FailuresToOpenSayWhy) {
+  EXPECT_FALSE(Extruder(static_cast<const ComponentLocation*>(nullptr), false).isInitedOK);
   // A file slot is created only by a writable stream.
   ComponentLocation user = At("FS0", "CFG", "USER");
   Extruder reader(&user, false);

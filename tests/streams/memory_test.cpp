@@ -37,6 +37,9 @@ TEST(MemoryStreams, SignedValuesAndBoolsGoOutAndComeBackBigEndian) {
   EXPECT_EQ(in.extrude(&flag), 0u);
   EXPECT_EQ(*reinterpret_cast<unsigned char*>(&flag), 0x02) << "the bool keeps the raw byte";
   EXPECT_EQ(Take<int>(in, 1), -0x01020305) << "the last value exhausts the buffer";
+  Extruder cut(buffer, 8);
+  cut.SetLength(3);  // the end moves, the position stays
+  EXPECT_EQ(std::make_pair(cut.length, cut.bytesLeft), std::make_pair(3u, 3u));
 }
 
 TEST(MemoryStreams, RefusedReadsAndWritesChangeNothingAndSayWhy) {

@@ -175,7 +175,6 @@ TEST(HostModeAttach, ReportsWhichFileIsWrong) {
       // block out.
       {"dev/mtd0.ini", "medium = nand\nwritesize = 512\noobsize = 16\n", "expected 65536"},
       {"dev/mtd0", std::string(3 * 32 * (512 + 16), 'x'), "take it with nanddump --oob --bb=dumpbad"},
-      {"dev/mtd0.ini", "medium = nor\n", "bytes, expected 65536"},
       {"dev/mtd0", std::string(0x10000, 'x'), ""},
       {"memory-map.ini", "[device NOR0]\ntechnology = SPI_NOR.\nsize = 0x10000\n",
        "needs technology, base and size"},
