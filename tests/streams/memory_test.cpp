@@ -135,6 +135,11 @@ TEST(MemoryStreams, BitFields) {
     const unsigned int value = unit == 2 ? cell.word : unit == 1 ? cell.byte : c.value;
     EXPECT_EQ(value, c.value) << c.width << "/" << c.highBit;
   }
+  const unsigned char last[] = {0x12, 0x34};  // a unit that ends the buffer is read
+  Extruder in(last, sizeof last);
+  UXB cell;
+  EXPECT_EQ(in.extrude(&cell, 16, 15), 1u);
+  EXPECT_EQ(cell.word, 0x1234);
 }
 
 TEST(MemoryStreams, GrowthTakesTheLargerOfStepAndRequestAndResumesAtTheOldEnd) {
@@ -155,6 +160,9 @@ TEST(MemoryStreams, GrowthTakesTheLargerOfStepAndRequestAndResumesAtTheOldEnd) {
   EXPECT_EQ(grown.intrude(static_cast<unsigned short>(0xB1B2)), 2u);
   EXPECT_TRUE(grown.ownsBuffer);
   EXPECT_EQ(Written(grown), (Bytes{0xA1, 0xB1, 0xB2}));
+  Intruder none(static_cast<unsigned char*>(nullptr), 4);  // a length but no buffer: nothing to copy
+  none.growthStep = 4;
+  EXPECT_EQ(none.intrude(static_cast<unsigned char>(0xC1)), 1u);
   Intruder huge(borrowed, 2);  // a step that would take the length past 32 bits
   huge.growthStep = 0xFFFFFFFFu;
   huge += 2;

@@ -3,16 +3,33 @@
 #include <unistd.h>
 
 #include <cstdio>
+#include <set>
 #include <string>
 
 #include "stbplat/ini_reader.h"
-#include "support/ini_recorder.h"
 #include "support/scratch_dir.h"
 #include "util/ini_core.h"
 
 namespace {
 
-using stbplat::test::IniRecorder;
+// Records what a parse hands to its handlers: one line for each call,
+// "[section] name=value" or the directive line.
+struct IniRecorder {
+  std::string seen;
+  // Names and directive lines the handlers return false for.
+  std::set<std::string> refused = {"refused", ":refused"};
+
+  static bool OnValue(void* user, const char* section, const char* name, const char* value) {
+    IniRecorder* self = static_cast<IniRecorder*>(user);
+    self->seen += "[" + std::string(section) + "] " + name + "=" + value + "\n";
+    return self->refused.count(name) == 0;
+  }
+  static bool OnDirective(void* user, const char* line) {
+    IniRecorder* self = static_cast<IniRecorder*>(user);
+    self->seen += std::string(line) + "\n";
+    return self->refused.count(line) == 0;
+  }
+};
 
 TEST(IniParse, LinesSectionsCommentsAndErrors) {
   struct Row {
