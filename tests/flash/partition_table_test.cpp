@@ -118,6 +118,11 @@ TEST_F(PartitionTableTest, NandDescriptorZeroCountsAsNotOpened) {
       "size\r\n"));
 }
 
+TEST_F(PartitionTableTest, NandDescriptorOneCountsAsOpened) {
+  sim_.SetFirstDescriptor(1);
+  EXPECT_EQ(Flash().nandSectorSize, kNandBlock);
+}
+
 TEST_F(PartitionTableTest, LookupByNameSearchesEveryRowAndLeavesOffset) {
   FlashInterface& flash = Flash();
   unsigned long offset = 0x55;
