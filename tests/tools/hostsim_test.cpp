@@ -125,6 +125,7 @@ TEST_F(HostModeTest, BadBlocksComeFromTheDumpsMarkersAndTheList) {
 TEST_F(HostModeTest, MarksAndErasesReachTheImagesAndLastBeyondTheRun) {
   ASSERT_EQ(0, Request("/dev/mtd2", MEMSETBADBLOCK, 5 * kBlock));
   ASSERT_EQ(0, Request("/dev/mtd4", MEMSETBADBLOCK, 3 * kBlock));
+  ASSERT_EQ(0, Request("/dev/mtd3", MEMSETBADBLOCK, kBlock));  // the window's block 1 is block 3
   Bytes dump = dir.Read("dev/mtd2");
   size_t block5 = 5 * (kBlock / kPage) * (kPage + kOob);
   EXPECT_EQ(0x00, dump[block5 + kPage]);  // the marker, in an erased block
@@ -134,6 +135,7 @@ TEST_F(HostModeTest, MarksAndErasesReachTheImagesAndLastBeyondTheRun) {
   Attach();
   EXPECT_EQ(1, Request("/dev/mtd2", MEMGETBADBLOCK, 5 * kBlock));
   EXPECT_EQ(1, Request("/dev/mtd4", MEMGETBADBLOCK, 3 * kBlock));
+  EXPECT_EQ(1, Request("/dev/mtd2", MEMGETBADBLOCK, 3 * kBlock));
 }
 
 TEST_F(HostModeTest, OtherPathsLieUnderTheRootOrPassThrough) {
