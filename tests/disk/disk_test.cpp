@@ -31,15 +31,20 @@ TEST(GetVendorInfo, FieldsAtTheirOffsetsCutToTheirWidths) {
   identity.replace(54, 18, "ST2000DM001-1CH164");
   sys.devices["/dev/sda"].identity = identity;
   sys.devices["/dev/sdb"];  // answers no identity request
-  char sda[] = "sda", sdb[] = "sdb", sdx[] = "sdx";
+  sys.devices["/dev/"];  // what an empty name would open
+  char sda[] = "sda", sdb[] = "sdb", sdx[] = "sdx", empty[] = "";
+  const std::string kCannotOpen = "ERROR: Cannot open device \n";
   testing::internal::CaptureStdout();
   EXPECT_EQ(GetVendorInfo(sda), 0);
   EXPECT_EQ(GetVendorInfo(sdb), 0);  // the failure message reads "successful", as it always has
   EXPECT_EQ(GetVendorInfo(sdx), -1);
+  EXPECT_EQ(GetVendorInfo(empty), -1);
+  EXPECT_EQ(GetVendorInfo(nullptr), -1);
   EXPECT_EQ(testing::internal::GetCapturedStdout(),
             "Hard Disk Model: ST2000DM001-1CH164" + std::string(22, '#') +
                 "\n  Serial Number: Z1E6ABCD" + std::string(12, '#') +
-                "\n ioctl HDIO_GET_IDENTITY successful \nERROR: Cannot open device \n");
+                "\n ioctl HDIO_GET_IDENTITY successful \n" + kCannotOpen + kCannotOpen +
+                kCannotOpen);
 }
 
 TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
@@ -95,7 +100,71 @@ TEST(GetHDDTemperature, PrintsTheTemperatureEntryEveryTenSeconds) {
   EXPECT_EQ(sys.lastDriveCommand, (std::array<unsigned char, 4>{0xB0, 0, 0xD0, 1}));
 }
 
-TEST(HardDriveProbeNodePosition, CountsListedDevicesScansNoMoreNodesAndFindsTheHost) {
+// Nodes sda .. sde as one letter each: '-' absent, 'a' an ATA disk, 's' a
+// small USB stick, 'U' a large USB disk whose identity checksum is right, 'r'
+// an empty card-reader slot (USB, does not open, no identity).
+void Attach(FakeSystem& sys, const std::string& nodes) {
+  for (size_t i = 0; i < nodes.size(); ++i) {
+    const std::string name = std::string("sd") + static_cast<char>('a' + i), path = "/dev/" + name;
+    if (nodes[i] == '-') continue;
+    sys.links[name] = nodes[i] == 'a' ? std::string(kAtaLink) : std::string(kUsbLink);
+    if (nodes[i] == 's' || nodes[i] == 'U')
+      sys.devices[path].size = nodes[i] == 's' ? 8LL << 30 : 1LL << 40;
+    sys.pipes.push_back({"hdparm -I " + path + " ", nodes[i] == 'U' ? "1\n" : "0\n"});
+  }
+}
+
+TEST(HardDriveProbeNodePosition, FindsTheDiskWhateverSitsBeforeItQuietly) {
+  struct Row {
+    const char* what;
+    unsigned int listed;  // devices in /proc/scsi/scsi
+    std::string nodes, lsmod, lateNodes;  // lateNodes: what the first wait brings
+    int node;  // -1: not found
+    unsigned int bus;  // the host in the link: 0 for the ATA disk, 6 for USB
+    size_t waits;
+  };
+  const std::string usbOnly = "Module  Size  Used by\nusb_storage 77824 0\nsd_mod 1 2\n";
+  const unsigned int none = HARD_DRIVE_BUS_UNKNOWN;
+  const Row rows[] = {
+      {"a stick pulled from sda", 1, "-a", "", "", 1, 0, 0},
+      {"an empty card reader before the disk", 2, "ra", "", "", 1, 0, 0},
+      {"only the card reader", 1, "r", "", "", -1, none, 0},
+      {"a large USB disk", 1, "U", "", "", 0, 6, 0},
+      {"an ATA disk wins over an earlier USB disk", 2, "Ua", "", "", 1, 0, 0},
+      {"the list bounds the nodes looked at", 1, "sa", "", "", -1, none, 0},
+      {"no list: every node", 0, "----a", "", "", 4, 0, 0},
+      {"the SATA driver loads after USB storage", 1, "s", usbOnly, "sa", 1, 0, 1},
+      {"it never comes", 1, "U", usbOnly, "", 0, 6, 3},
+      {"it is loaded", 1, "s", usbOnly + "ahci 1 0\n", "", -1, none, 0},
+      {"a name that only starts like a module", 1, "s", "usb_storage_x 1 0\n", "", -1, none, 0},
+  };
+  for (const Row& row : rows) {
+    SCOPED_TRACE(row.what);
+    FakeSystem sys;
+    auto list = [&](unsigned int devices) {
+      std::string& text = sys.files["/proc/scsi/scsi"] = "Attached devices:\n";
+      for (unsigned int i = 0; i < devices; ++i) text += "Host: scsi0 Channel: 00\n";
+    };
+    if (row.listed != 0) list(row.listed);
+    Attach(sys, row.nodes);
+    sys.pipes.push_back({"lsmod", row.lsmod});
+    sys.sleepsLeft = 10;
+    sys.onSleep = [&] {
+      if (row.lateNodes.empty()) return;
+      Attach(sys, row.lateNodes);
+      list(static_cast<unsigned int>(row.lateNodes.size()));
+    };
+    HardDriveNodeInfo drive;
+    testing::internal::CaptureStdout();
+    EXPECT_EQ(HardDriveProbeNodePosition(&drive), row.node >= 0 ? 1 : 0);
+    EXPECT_EQ(testing::internal::GetCapturedStdout(), "");
+    EXPECT_EQ(drive.deviceNode, row.node >= 0 ? row.node : HARD_DRIVE_NODE_COUNT);
+    EXPECT_EQ(drive.scsiBus, row.bus);
+    EXPECT_EQ(sys.sleeps, std::vector<unsigned int>(row.waits, 1));
+  }
+}
+
+TEST(HardDriveProbeNodePosition, ListReadInPiecesHostNumbersAndMessages) {
   FakeSystem sys;
   HardDriveNodeInfo drive;
   std::memset(&drive, 0xEE, sizeof drive);
@@ -103,27 +172,22 @@ TEST(HardDriveProbeNodePosition, CountsListedDevicesScansNoMoreNodesAndFindsTheH
   EXPECT_EQ(HardDriveProbeNodePosition(&drive), 0);  // no list: all five nodes looked at
   const HardDriveNodeInfo cleared{0, HARD_DRIVE_BUS_UNKNOWN, HARD_DRIVE_NODE_COUNT, {}};
   EXPECT_EQ(std::memcmp(&drive, &cleared, sizeof drive), 0);
-  EXPECT_EQ(HardDriveProbeSataPosition(&drive), 0);
   // The first entry's line is read in pieces of 255; the next piece starts with "Host:".
   sys.files["/proc/scsi/scsi"] = "Attached devices:\nHost: scsi0 " + std::string(243, 'x') +
                                  "Host: scsi9\nHost: scsi1 Channel: 00\n";
-  sys.links["sda"] = kUsbLink;  // a small stick
-  sys.devices["/dev/sda"].size = 8LL << 30;
-  // Only a "/hostN/" component below 2^32 - 1 names the host.
-  sys.links["sdc"] = "../../devices/hostx/host7x/host4294967295/ata3/host12/target12:0:0/block/sdc";
   EXPECT_EQ(HardDriveProbeSataPosition(&drive), 1);
   EXPECT_EQ(drive.scsiDeviceCount, 2u);
-  EXPECT_EQ(HardDriveScanDeviceNode(&drive), 0);  // sdc lies beyond the two devices listed
+  // Only a "/hostN/" component below 2^32 - 1 names the host.
+  sys.links["sdc"] = "../../devices/hostx/host7x/host4294967295/ata3/host12/target12:0:0/block/sdc";
   sys.files["/proc/scsi/scsi"] = "Attached devices:\n";
   EXPECT_EQ(HardDriveProbeSataPosition(&drive), 0);
-  EXPECT_EQ(HardDriveScanDeviceNode(&drive), 1);  // every node again
+  EXPECT_EQ(HardDriveScanDeviceNode(&drive), 1);
   EXPECT_EQ(drive.deviceNode, 2);
   EXPECT_EQ(drive.scsiBus, 12u);
   const std::string sata = kError + "HardDriveProbeSataPosition] ";
-  const std::string notFound = kError + "HardDriveScanDeviceNode] Hard Drive Not Found\n\r";
-  const std::string noList = sata + "Failed To Open /proc/scsi/scsi\n\r";
-  EXPECT_EQ(log.texts(),
-            (Texts{noList, notFound, noList, notFound, sata + "No Scsi Device Attached\n\r"}));
+  EXPECT_EQ(log.texts(), (Texts{sata + "Failed To Open /proc/scsi/scsi\n\r",
+                                kError + "HardDriveScanDeviceNode] Hard Drive Not Found\n\r",
+                                sata + "No Scsi Device Attached\n\r"}));
   EXPECT_EQ(log.messages()[0].module, 18);
   EXPECT_EQ(log.messages()[0].level, 6u);
   EXPECT_EQ(log.messages()[0].sourceFile, "HardDriveTempUtils");
@@ -151,13 +215,14 @@ TEST(HardDriveProbeScsiBusPosition, BusAmongTheGenericDevices) {
 TEST(HardDriveGetVendorType, FirstPatternHdparmCountsAndEachPipeFailure) {
   FakeSystem sys;
   sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}};
-  HardDriveNodeInfo sdd{0, 0, 3, {}};
+  HardDriveNodeInfo sde{0, 0, 4, {}}, sdf{0, 0, 5, {}};
   unsigned int vendor = 99;
-  EXPECT_EQ(HardDriveGetVendorType(&sdd, &vendor), 1);
+  EXPECT_EQ(HardDriveGetVendorType(&sde, &vendor), 1);
   EXPECT_EQ(vendor, 3u);
   EXPECT_EQ(sys.commands.size(), 4u);  // the vendors' columns below prove the patterns' order
-  EXPECT_EQ(sys.commands.back(), "hdparm -i /dev/sdd 2>/dev/null | grep -i -c Model=To");
+  EXPECT_EQ(sys.commands.back(), "hdparm -i /dev/sde 2>/dev/null | grep -i -c Model=To");
   LogCapture log;
+  EXPECT_EQ(HardDriveGetVendorType(&sdf, &vendor), 0);
   HardDriveNodeInfo sda{};
   sys.pipes.clear();
   EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);  // hdparm prints nothing
@@ -170,7 +235,8 @@ TEST(HardDriveGetVendorType, FirstPatternHdparmCountsAndEachPipeFailure) {
   EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);
   const std::string type = kError + "HardDriveGetVendorType] ";
   const std::string closeFailed = type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r";
-  EXPECT_EQ(log.texts(), (Texts{type + "Scan Model Failed\n\r", type + "Scan Model Failed\n\r",
+  EXPECT_EQ(log.texts(), (Texts{type + "Failed To Input Wrong Device Node Number (5)\n\r",
+                                type + "Scan Model Failed\n\r", type + "Scan Model Failed\n\r",
                                 closeFailed, closeFailed,
                                 type + "Failed To Open The Pipe-Hdparm Node[/dev/sda]\n\r"}));
   EXPECT_EQ(HardDriveGetVendorType(nullptr, &vendor), 0);
@@ -191,6 +257,7 @@ TEST(HardDriveGetTemperatureData, OneReadingOrTheFailureOfEachStep) {
   // Refused before any command runs.
   EXPECT_EQ(HardDriveGetTemperatureData(&sdf, 10, &value), 0);
   EXPECT_EQ(HardDriveGetTemperatureData(&sda, 10, nullptr), 0);
+  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 13, &value), 0);
   EXPECT_EQ(HardDriveGetTemperatureData(&sda, 12, &value), 0);  // no "/max)"
   sys.pipeCloseFails = true;
   EXPECT_EQ(HardDriveGetTemperatureData(&sda, 10, &value), 0);  // nothing printed
@@ -202,7 +269,8 @@ TEST(HardDriveGetTemperatureData, OneReadingOrTheFailureOfEachStep) {
   const std::string data = kError + "HardDriveGetTemperatureData] ";
   const std::string scanFailed = data + "Scan Data Failed\n\r";
   EXPECT_EQ(log.texts(), (Texts{data + "Failed To Input Wrong Device Node Number (5)\n\r",
-                                data + "pData : Null Pointer Assignment\n\r", scanFailed, scanFailed,
+                                data + "pData : Null Pointer Assignment\n\r",
+                                data + "Failed To Input Wrong Offset (13)\n\r", scanFailed, scanFailed,
                                 data + "Failed To Close The Pipe-Smartctl Node[/dev/sda]\n\r",
                                 data + "Failed To Close The Pipe-Smartctl Node[/dev/sde]\n\r",
                                 data + "Failed To Open The Pipe-Smartctl Node[/dev/sda]\n\r"}));
@@ -212,22 +280,23 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
   struct Row {
     const char* model;
     Texts columns;  // what awk prints for columns 4, 5, 10 and 12
+    std::string asked;  // the columns asked for, in order
     bool result;
     unsigned int current, highest;
   };
   const Row rows[] = {
-      {"ST", {"", "53", "36", ""}, true, 36, 53},
-      {"WD", {"100", "98", "40", ""}, true, 40, 42},
-      {"WD", {"90", "100", "5", ""}, true, 5, 5u - 10u},  // worked out wide, kept in 32 bits
-      {"Hi", {"", "", "35", "21/47)"}, true, 35, 47},
-      {"To", {"", "", "38", "15/52)"}, true, 38, 52},
+      {"ST", {"", "53", "36", ""}, "5 10", true, 36, 53},
+      {"WD", {"100", "98", "40", ""}, "4 5 10", true, 40, 42},
+      {"WD", {"90", "100", "5", ""}, "4 5 10", true, 5, 5u - 10u},  // worked out wide, kept in 32 bits
+      {"Hi", {"", "", "35", "21/47)"}, "12 10", true, 35, 47},
+      {"To", {"", "", "38", "15/52)"}, "12 10", true, 38, 52},
       // The first failed reading ends it with a zero pair.
-      {"WD", {"", "98", "40", ""}, false, 0, 0},
-      {"WD", {"100", "", "40", ""}, false, 0, 0},
-      {"WD", {"100", "98", "", ""}, false, 0, 0},
-      {"ST", {"", "53", "", ""}, false, 0, 0},
-      {"Hi", {"", "", "35", ""}, false, 0, 0},
-      {"XX", {"", "53", "36", ""}, false, 7, 7},  // no vendor: the pair is left alone
+      {"WD", {"", "98", "40", ""}, "4", false, 0, 0},
+      {"WD", {"100", "", "40", ""}, "4 5", false, 0, 0},
+      {"WD", {"100", "98", "", ""}, "4 5 10", false, 0, 0},
+      {"ST", {"", "53", "", ""}, "5 10", false, 0, 0},
+      {"Hi", {"", "", "35", ""}, "12", false, 0, 0},
+      {"XX", {"", "53", "36", ""}, "", false, 7, 7},  // no vendor: the pair is left alone
   };
   for (const Row& row : rows) {
     SCOPED_TRACE(std::string(row.model) + " " + std::to_string(row.current));
@@ -240,6 +309,12 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
     EXPECT_EQ(HardDriveGetTemperature(&drive, pair), row.result);
     EXPECT_EQ(pair[0], row.current);
     EXPECT_EQ(pair[1], row.highest);
+    std::string asked;
+    for (const std::string& command : sys.commands) {
+      const size_t column = command.find("print $") + 7;
+      if (column != 6) asked += (asked.empty() ? "" : " ") + std::to_string(std::stoi(command.substr(column)));
+    }
+    EXPECT_EQ(asked, row.asked);
   }
 }
 
@@ -252,7 +327,9 @@ TEST(GetHdTemperature, NoDiskOrNoReading) {
   EXPECT_EQ(temperature, 99);
   sys.links["sda"] = kAtaLink;
   sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}, {Column(10), "38\n"}};
+  testing::internal::CaptureStdout();
   EXPECT_FALSE(GetHdTemperature(&temperature));  // column 12 prints nothing
+  EXPECT_EQ(testing::internal::GetCapturedStdout(), "");  // a poll prints nothing
   EXPECT_EQ(temperature, 0);
   EXPECT_TRUE(log.Contains("ERROR... HDProbeNodePosition function failed\n"));
   EXPECT_EQ(log.texts().back(), "Drive Temperature was no available\n");

@@ -92,6 +92,7 @@ os::SysCalls Calls() {
   };
   calls.sleep = [](unsigned int seconds) -> unsigned int {
     g_sys->sleeps.push_back(seconds);
+    if (g_sys->onSleep) g_sys->onSleep();
     if (--g_sys->sleepsLeft <= 0) throw StopLoop();
     return 0;
   };
