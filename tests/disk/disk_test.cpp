@@ -1,8 +1,7 @@
 // The disk probes over the simulated machine: identity, size, disk
 // detection and the SMART loop, which print; then the probes that log: where
-// the disk sits (the SCSI device count, the scan of sda .. sde, the SCSI
-// generic bus), its vendor asked of hdparm, and its temperature read from
-// smartctl's pipe.
+// the disk sits, the SCSI generic bus, the vendor asked of hdparm and the
+// temperature read from smartctl's pipe.
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -24,33 +23,39 @@ const std::string kError = "\n\r[ErrorMsg] [";
 
 std::string Column(int column) { return "{print $" + std::to_string(column) + "}"; }
 
+template <typename Call>
+std::string Printed(Call call) {
+  testing::internal::CaptureStdout();
+  call();
+  return testing::internal::GetCapturedStdout();
+}
+
 TEST(GetVendorInfo, FieldsAtTheirOffsetsCutToTheirWidths) {
   FakeSystem sys;
   std::string identity(512, '#');
-  identity.replace(20, 8, "Z1E6ABCD");
-  identity.replace(54, 18, "ST2000DM001-1CH164");
+  identity.replace(20, 8, "Z1E6ABCD").replace(54, 18, "ST2000DM001-1CH164");
   sys.devices["/dev/sda"].identity = identity;
   sys.devices["/dev/sdb"];  // answers no identity request
-  sys.devices["/dev/"];  // what an empty name would open
+  sys.devices["/dev/"];     // what an empty name would open
   char sda[] = "sda", sdb[] = "sdb", sdx[] = "sdx", empty[] = "";
-  const std::string kCannotOpen = "ERROR: Cannot open device \n";
-  testing::internal::CaptureStdout();
-  EXPECT_EQ(GetVendorInfo(sda), 0);
-  EXPECT_EQ(GetVendorInfo(sdb), 0);  // the failure message reads "successful", as it always has
-  EXPECT_EQ(GetVendorInfo(sdx), -1);
-  EXPECT_EQ(GetVendorInfo(empty), -1);
-  EXPECT_EQ(GetVendorInfo(nullptr), -1);
-  EXPECT_EQ(testing::internal::GetCapturedStdout(),
-            "Hard Disk Model: ST2000DM001-1CH164" + std::string(22, '#') +
-                "\n  Serial Number: Z1E6ABCD" + std::string(12, '#') +
-                "\n ioctl HDIO_GET_IDENTITY successful \n" + kCannotOpen + kCannotOpen +
-                kCannotOpen);
+  std::vector<int> results;
+  const std::string printed = Printed([&] {
+    for (char* name : {sda, sdb, sdx, empty, static_cast<char*>(nullptr)})
+      results.push_back(GetVendorInfo(name));
+  });
+  EXPECT_EQ(results, (std::vector<int>{0, 0, -1, -1, -1}));
+  const std::string cannotOpen = "ERROR: Cannot open device \n";
+  // The failure message reads "successful", as it always has.
+  EXPECT_EQ(printed, "Hard Disk Model: ST2000DM001-1CH164" + std::string(22, '#') +
+                         "\n  Serial Number: Z1E6ABCD" + std::string(12, '#') +
+                         "\n ioctl HDIO_GET_IDENTITY successful \n" + cannotOpen + cannotOpen +
+                         cannotOpen);
 }
 
 TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
   struct Row {
     std::string link;
-    long long size;    // negative: the size request fails
+    long long size;  // negative: the size request fails
     int result;
     std::string output;
   };
@@ -67,11 +72,10 @@ TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
     FakeSystem sys;
     sys.links["sdb"] = row.link;
     sys.devices["/dev/sdb"].size = row.size;
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(IsDevHDD("sdb"), row.result);
-    EXPECT_EQ(testing::internal::GetCapturedStdout(), row.output);
-    // Only a USB device's size is asked for.
-    EXPECT_EQ(sys.opened.size(), row.link == kUsbLink ? 1u : 0u);
+    int result = -1;
+    EXPECT_EQ(Printed([&] { result = IsDevHDD("sdb"); }), row.output);
+    EXPECT_EQ(result, row.result);
+    EXPECT_EQ(sys.opened.size(), row.link == kUsbLink ? 1u : 0u);  // only USB sizes are asked
   }
 }
 
@@ -107,9 +111,9 @@ void Attach(FakeSystem& sys, const std::string& nodes) {
   for (size_t i = 0; i < nodes.size(); ++i) {
     const std::string name = std::string("sd") + static_cast<char>('a' + i), path = "/dev/" + name;
     if (nodes[i] == '-') continue;
-    sys.links[name] = nodes[i] == 'a' ? std::string(kAtaLink) : std::string(kUsbLink);
+    sys.links[name] = nodes[i] == 'a' ? kAtaLink : kUsbLink;
     if (nodes[i] == 's' || nodes[i] == 'U')
-      sys.devices[path].size = nodes[i] == 's' ? 8LL << 30 : 1LL << 40;
+      sys.devices[path].size = 1LL << (nodes[i] == 's' ? 33 : 40);
     sys.pipes.push_back({"hdparm -I " + path + " ", nodes[i] == 'U' ? "1\n" : "0\n"});
   }
 }
@@ -117,7 +121,7 @@ void Attach(FakeSystem& sys, const std::string& nodes) {
 TEST(HardDriveProbeNodePosition, FindsTheDiskWhateverSitsBeforeItQuietly) {
   struct Row {
     const char* what;
-    unsigned int listed;  // devices in /proc/scsi/scsi
+    unsigned int listed;  // devices in /proc/scsi/scsi; 0: no list
     std::string nodes, lsmod, lateNodes;  // lateNodes: what the first wait brings
     int node;  // -1: not found
     unsigned int bus;  // the host in the link: 0 for the ATA disk, 6 for USB
@@ -141,23 +145,22 @@ TEST(HardDriveProbeNodePosition, FindsTheDiskWhateverSitsBeforeItQuietly) {
   for (const Row& row : rows) {
     SCOPED_TRACE(row.what);
     FakeSystem sys;
-    auto list = [&](unsigned int devices) {
+    auto list = [&](size_t devices) {
       std::string& text = sys.files["/proc/scsi/scsi"] = "Attached devices:\n";
-      for (unsigned int i = 0; i < devices; ++i) text += "Host: scsi0 Channel: 00\n";
+      for (size_t i = 0; i < devices; ++i) text += "Host: scsi0 Channel: 00\n";
     };
     if (row.listed != 0) list(row.listed);
     Attach(sys, row.nodes);
     sys.pipes.push_back({"lsmod", row.lsmod});
     sys.sleepsLeft = 10;
     sys.onSleep = [&] {
-      if (row.lateNodes.empty()) return;
+      if (!row.lateNodes.empty()) list(row.lateNodes.size());
       Attach(sys, row.lateNodes);
-      list(static_cast<unsigned int>(row.lateNodes.size()));
     };
     HardDriveNodeInfo drive;
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(HardDriveProbeNodePosition(&drive), row.node >= 0 ? 1 : 0);
-    EXPECT_EQ(testing::internal::GetCapturedStdout(), "");
+    int found = -1;
+    EXPECT_EQ(Printed([&] { found = HardDriveProbeNodePosition(&drive); }), "");
+    EXPECT_EQ(found, row.node >= 0 ? 1 : 0);
     EXPECT_EQ(drive.deviceNode, row.node >= 0 ? row.node : HARD_DRIVE_NODE_COUNT);
     EXPECT_EQ(drive.scsiBus, row.bus);
     EXPECT_EQ(sys.sleeps, std::vector<unsigned int>(row.waits, 1));
@@ -169,7 +172,7 @@ TEST(HardDriveProbeNodePosition, ListReadInPiecesHostNumbersAndMessages) {
   HardDriveNodeInfo drive;
   std::memset(&drive, 0xEE, sizeof drive);
   LogCapture log;
-  EXPECT_EQ(HardDriveProbeNodePosition(&drive), 0);  // no list: all five nodes looked at
+  EXPECT_EQ(HardDriveProbeNodePosition(&drive), 0);
   const HardDriveNodeInfo cleared{0, HARD_DRIVE_BUS_UNKNOWN, HARD_DRIVE_NODE_COUNT, {}};
   EXPECT_EQ(std::memcmp(&drive, &cleared, sizeof drive), 0);
   // The first entry's line is read in pieces of 255; the next piece starts with "Host:".
@@ -208,78 +211,80 @@ TEST(HardDriveProbeScsiBusPosition, BusAmongTheGenericDevices) {
   const std::string probe = kError + "HardDriveProbeScsiBusPosition] ";
   EXPECT_EQ(log.texts(), (Texts{probe + "Scsi Device7 Bus3 Not Found\n\r",
                                 probe + "Failed On SCSI_IOCTL_GET_BUS_NUMBER\n\r"}));
-  EXPECT_EQ(sys.opened, (Texts{"/dev/sg0", "/dev/sg1", "/dev/sg2", "/dev/sg0", "/dev/sg1",
-                               "/dev/sg2", "/dev/sg3", "/dev/sg4", "/dev/sg0"}));
+  EXPECT_EQ(sys.opened.size(), 9u);  // sg0 .. sg2, then all five, then sg0
 }
 
-TEST(HardDriveGetVendorType, FirstPatternHdparmCountsAndEachPipeFailure) {
-  FakeSystem sys;
-  sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}};
-  HardDriveNodeInfo sde{0, 0, 4, {}}, sdf{0, 0, 5, {}};
-  unsigned int vendor = 99;
-  EXPECT_EQ(HardDriveGetVendorType(&sde, &vendor), 1);
-  EXPECT_EQ(vendor, 3u);
-  EXPECT_EQ(sys.commands.size(), 4u);  // the vendors' columns below prove the patterns' order
-  EXPECT_EQ(sys.commands.back(), "hdparm -i /dev/sde 2>/dev/null | grep -i -c Model=To");
-  LogCapture log;
-  EXPECT_EQ(HardDriveGetVendorType(&sdf, &vendor), 0);
-  HardDriveNodeInfo sda{};
-  sys.pipes.clear();
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);  // hdparm prints nothing
-  sys.pipeCloseFails = true;
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);
-  sys.pipes = {{"Model=ST", "1\n"}};
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);  // a match is lost with its pipe
-  EXPECT_EQ(vendor, 4u);
-  sys.pipeOpenFails = true;
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);
+// The pipe-reading probes: each row sets up hdparm's and smartctl's output,
+// makes one call, and checks its result and messages.
+TEST(PipeProbes, VendorAndReadingsOrTheFailureOfEachStep) {
   const std::string type = kError + "HardDriveGetVendorType] ";
-  const std::string closeFailed = type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r";
-  EXPECT_EQ(log.texts(), (Texts{type + "Failed To Input Wrong Device Node Number (5)\n\r",
-                                type + "Scan Model Failed\n\r", type + "Scan Model Failed\n\r",
-                                closeFailed, closeFailed,
-                                type + "Failed To Open The Pipe-Hdparm Node[/dev/sda]\n\r"}));
-  EXPECT_EQ(HardDriveGetVendorType(nullptr, &vendor), 0);
-}
-
-TEST(HardDriveGetTemperatureData, OneReadingOrTheFailureOfEachStep) {
-  FakeSystem sys;
-  sys.pipes = {{Column(5), "300\n"}, {Column(4), "1234\n"}, {Column(12), "21\n"}};
-  HardDriveNodeInfo sda{}, sde{0, 0, 4, {}}, sdf{0, 0, 5, {}};
-  unsigned char value = 0;
-  LogCapture log;
-  EXPECT_EQ(HardDriveGetTemperatureData(&sde, 5, &value), 1);
-  EXPECT_EQ(value, 300 & 0xFF);  // kept in 8 bits
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 4, &value), 1);
-  EXPECT_EQ(value, 123);  // three digits at most
-  EXPECT_EQ(sys.commands[0],
-            "smartctl -d ata -A /dev/sde | grep -i Temperature_Celsius | awk '{print $5}' ");
-  // Refused before any command runs.
-  EXPECT_EQ(HardDriveGetTemperatureData(&sdf, 10, &value), 0);
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 10, nullptr), 0);
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 13, &value), 0);
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 12, &value), 0);  // no "/max)"
-  sys.pipeCloseFails = true;
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 10, &value), 0);  // nothing printed
-  EXPECT_EQ(value, 123);
-  EXPECT_EQ(HardDriveGetTemperatureData(&sde, 5, &value), 0);
-  EXPECT_EQ(value, 44);  // stored before the close failed
-  sys.pipeOpenFails = true;
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 5, &value), 0);
   const std::string data = kError + "HardDriveGetTemperatureData] ";
-  const std::string scanFailed = data + "Scan Data Failed\n\r";
-  EXPECT_EQ(log.texts(), (Texts{data + "Failed To Input Wrong Device Node Number (5)\n\r",
-                                data + "pData : Null Pointer Assignment\n\r",
-                                data + "Failed To Input Wrong Offset (13)\n\r", scanFailed, scanFailed,
-                                data + "Failed To Close The Pipe-Smartctl Node[/dev/sda]\n\r",
-                                data + "Failed To Close The Pipe-Smartctl Node[/dev/sde]\n\r",
-                                data + "Failed To Open The Pipe-Smartctl Node[/dev/sda]\n\r"}));
+  struct Row {
+    unsigned char node, column;  // column 0: ask for the vendor
+    std::vector<std::pair<std::string, std::string>> pipes;
+    bool openFails, closeFails;
+    int result, value;  // the vendor or the reading
+    Texts log;
+  };
+  const Row rows[] = {
+      {4, 0, {{"-c Model=To", "1\n"}, {"grep", "0\n"}}, false, false, 1, 3, {}},
+      {5, 0, {}, false, false, 0, 4, {type + "Failed To Input Wrong Device Node Number (5)\n\r"}},
+      {0, 0, {}, false, false, 0, 4, {type + "Scan Model Failed\n\r"}},  // hdparm prints nothing
+      {0, 0, {}, false, true, 0, 4,
+       {type + "Scan Model Failed\n\r", type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      // A match is lost with its pipe.
+      {0, 0, {{"Model=ST", "1\n"}}, false, true, 0, 4,
+       {type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      {0, 0, {}, true, false, 0, 4, {type + "Failed To Open The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      {4, 5, {{Column(5), "300\n"}}, false, false, 1, 300 & 0xFF, {}},  // kept in 8 bits
+      {0, 4, {{Column(4), "1234\n"}}, false, false, 1, 123, {}},        // three digits at most
+      {0, 12, {{Column(12), "21/47)\n"}}, false, false, 1, 47, {}},
+      // Refused before any command runs.
+      {5, 10, {}, false, false, 0, 0, {data + "Failed To Input Wrong Device Node Number (5)\n\r"}},
+      {0, 13, {}, false, false, 0, 0, {data + "Failed To Input Wrong Offset (13)\n\r"}},
+      {0, 12, {{Column(12), "21\n"}}, false, false, 0, 0, {data + "Scan Data Failed\n\r"}},
+      {0, 10, {}, false, true, 0, 0,
+       {data + "Scan Data Failed\n\r", data + "Failed To Close The Pipe-Smartctl Node[/dev/sda]\n\r"}},
+      // Stored before the close failed.
+      {4, 5, {{Column(5), "44\n"}}, false, true, 0, 44,
+       {data + "Failed To Close The Pipe-Smartctl Node[/dev/sde]\n\r"}},
+      {0, 5, {}, true, false, 0, 0, {data + "Failed To Open The Pipe-Smartctl Node[/dev/sda]\n\r"}},
+  };
+  Texts lastCommands;
+  for (const Row& row : rows) {
+    SCOPED_TRACE(std::to_string(row.node) + " " + std::to_string(row.column));
+    FakeSystem sys;
+    sys.pipes = row.pipes;
+    sys.pipeOpenFails = row.openFails;
+    sys.pipeCloseFails = row.closeFails;
+    HardDriveNodeInfo drive{0, 0, row.node, {}};
+    unsigned int vendor = 99;
+    unsigned char value = 0;
+    LogCapture log;
+    EXPECT_EQ(row.column == 0 ? HardDriveGetVendorType(&drive, &vendor)
+                              : HardDriveGetTemperatureData(&drive, row.column, &value),
+              row.result);
+    EXPECT_EQ(row.column == 0 ? static_cast<int>(vendor) : value, row.value);
+    EXPECT_EQ(log.texts(), row.log);
+    lastCommands.push_back(sys.commands.empty() ? "" : sys.commands.back());
+    if (&row == rows) {
+      EXPECT_EQ(sys.commands.size(), 4u);  // the vendor columns prove the patterns' order
+    }
+  }
+  EXPECT_EQ(lastCommands[0], "hdparm -i /dev/sde 2>/dev/null | grep -i -c Model=To");
+  EXPECT_EQ(lastCommands[6],
+            "smartctl -d ata -A /dev/sde | grep -i Temperature_Celsius | awk '{print $5}' ");
+  unsigned int vendor = 0;
+  unsigned char value = 0;
+  HardDriveNodeInfo sda{};
+  EXPECT_EQ(HardDriveGetVendorType(nullptr, &vendor) + HardDriveGetTemperatureData(nullptr, 10, &value) +
+                HardDriveGetTemperatureData(&sda, 10, nullptr), 0);
 }
 
-TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
+TEST(HardDriveGetTemperature, EachVendorsColumnsInOrderAndPair) {
   struct Row {
     const char* model;
-    Texts columns;  // what awk prints for columns 4, 5, 10 and 12
+    Texts columns;      // what awk prints for columns 4, 5, 10 and 12
     std::string asked;  // the columns asked for, in order
     bool result;
     unsigned int current, highest;
@@ -287,7 +292,7 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
   const Row rows[] = {
       {"ST", {"", "53", "36", ""}, "5 10", true, 36, 53},
       {"WD", {"100", "98", "40", ""}, "4 5 10", true, 40, 42},
-      {"WD", {"90", "100", "5", ""}, "4 5 10", true, 5, 5u - 10u},  // worked out wide, kept in 32 bits
+      {"WD", {"90", "100", "5", ""}, "4 5 10", true, 5, 5u - 10u},  // worked out wide, 32 bits
       {"Hi", {"", "", "35", "21/47)"}, "12 10", true, 35, 47},
       {"To", {"", "", "38", "15/52)"}, "12 10", true, 38, 52},
       // The first failed reading ends it with a zero pair.
@@ -299,7 +304,7 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
       {"XX", {"", "53", "36", ""}, "", false, 7, 7},  // no vendor: the pair is left alone
   };
   for (const Row& row : rows) {
-    SCOPED_TRACE(std::string(row.model) + " " + std::to_string(row.current));
+    SCOPED_TRACE(std::string(row.model) + " " + row.asked);
     FakeSystem sys;
     sys.pipes = {{std::string("-c Model=") + row.model, "1\n"}, {"grep -i -c", "0\n"},
                  {Column(4), row.columns[0]}, {Column(5), row.columns[1]},
@@ -307,12 +312,12 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
     HardDriveNodeInfo drive{};
     unsigned int pair[2] = {7, 7};
     EXPECT_EQ(HardDriveGetTemperature(&drive, pair), row.result);
-    EXPECT_EQ(pair[0], row.current);
-    EXPECT_EQ(pair[1], row.highest);
+    EXPECT_EQ(std::make_pair(pair[0], pair[1]), std::make_pair(row.current, row.highest));
     std::string asked;
     for (const std::string& command : sys.commands) {
-      const size_t column = command.find("print $") + 7;
-      if (column != 6) asked += (asked.empty() ? "" : " ") + std::to_string(std::stoi(command.substr(column)));
+      const size_t column = command.find("print $");
+      if (column != std::string::npos)
+        asked += (asked.empty() ? "" : " ") + std::to_string(std::stoi(command.substr(column + 7)));
     }
     EXPECT_EQ(asked, row.asked);
   }
@@ -327,9 +332,9 @@ TEST(GetHdTemperature, NoDiskOrNoReading) {
   EXPECT_EQ(temperature, 99);
   sys.links["sda"] = kAtaLink;
   sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}, {Column(10), "38\n"}};
-  testing::internal::CaptureStdout();
-  EXPECT_FALSE(GetHdTemperature(&temperature));  // column 12 prints nothing
-  EXPECT_EQ(testing::internal::GetCapturedStdout(), "");  // a poll prints nothing
+  bool result = true;
+  EXPECT_EQ(Printed([&] { result = GetHdTemperature(&temperature); }), "");  // a poll prints nothing
+  EXPECT_FALSE(result);  // column 12 prints nothing
   EXPECT_EQ(temperature, 0);
   EXPECT_TRUE(log.Contains("ERROR... HDProbeNodePosition function failed\n"));
   EXPECT_EQ(log.texts().back(), "Drive Temperature was no available\n");

@@ -46,7 +46,6 @@ struct FakeSystem {
   std::function<void()> onSleep;  // what changes while the caller sleeps
 
   std::vector<std::string> opened;  // open and fopen64 paths
-  std::vector<std::string> linksRead;
   std::vector<std::string> commands;
   std::vector<unsigned int> sleeps;
   std::array<unsigned char, 4> lastDriveCommand{};
