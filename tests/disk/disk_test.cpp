@@ -323,7 +323,7 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsInOrderAndPair) {
   }
 }
 
-TEST(GetHdTemperature, NoDiskOrNoReading) {
+TEST(GetHdTemperature, NoDiskNoReadingOrTheReading) {
   FakeSystem sys;
   int temperature = 99;
   LogCapture log;
@@ -331,13 +331,17 @@ TEST(GetHdTemperature, NoDiskOrNoReading) {
   EXPECT_FALSE(GetHdTemperature(&temperature));
   EXPECT_EQ(temperature, 99);
   sys.links["sda"] = kAtaLink;
-  sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}, {Column(10), "38\n"}};
+  sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}};
   bool result = true;
   EXPECT_EQ(Printed([&] { result = GetHdTemperature(&temperature); }), "");  // a poll prints nothing
   EXPECT_FALSE(result);  // column 12 prints nothing
   EXPECT_EQ(temperature, 0);
   EXPECT_TRUE(log.Contains("ERROR... HDProbeNodePosition function failed\n"));
   EXPECT_EQ(log.texts().back(), "Drive Temperature was no available\n");
+  sys.pipes.insert(sys.pipes.begin(), {{Column(12), "21/47)\n"}, {Column(10), "38\n"}});
+  EXPECT_TRUE(GetHdTemperature(&temperature));
+  EXPECT_EQ(temperature, 38);
+  EXPECT_EQ(log.texts().back(), "Current Temp = 38  :  High Temp = 47\n");
 }
 
 }  // namespace
