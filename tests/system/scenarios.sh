@@ -66,13 +66,15 @@ if want smoke.devmem; then
 fi
 
 if want smoke.disk_tools; then
+  # sda is the USB stick, sdb the disk (see init.sh).
   s=smoke.disk_tools
-  hdparm -i /dev/sda >/tmp/hd 2>&1
+  hdparm -i /dev/sdb >/tmp/hd 2>&1
   check $s "hdparm model" has 'Model=ST1000DM003-1SB102' /tmp/hd
-  smartctl -d ata -A /dev/sda >/tmp/sm 2>&1
+  smartctl -d ata -A /dev/sdb >/tmp/sm 2>&1
   check $s "smartctl temperature line" has 'Temperature_Celsius' /tmp/sm
-  info "smartctl -d ata -A /dev/sda: $(grep -i temperature /tmp/sm | tr -s ' ')"
-  check $s "sda on ATA" sh -c 'readlink /sys/class/block/sda | grep -q /ata'
+  info "smartctl -d ata -A /dev/sdb: $(grep -i temperature /tmp/sm | tr -s ' ')"
+  check $s "sdb on ATA" sh -c 'readlink /sys/class/block/sdb | grep -q /ata'
+  check $s "sda on USB" sh -c 'readlink /sys/class/block/sda | grep -q /usb'
   scenario_end $s
 fi
 

@@ -1,6 +1,6 @@
-// Disk probing against the emulated AHCI disk (/dev/sda, model
-// ST1000DM003-1SB102, serial Z9A0SYS1, 256 MiB) and the virtio disk
-// (/dev/vda, 64 MiB).
+// Disk probing against the emulated AHCI disk (/dev/sdb, model
+// ST1000DM003-1SB102, serial Z9A0SYS1, 256 MiB), a USB stick on the lower
+// letter (/dev/sda, 16 MiB) and the virtio disk (/dev/vda, 64 MiB).
 #include <signal.h>
 #include <sys/wait.h>
 
@@ -8,34 +8,38 @@
 #include "stbplat/disk.h"
 
 const std::string kAtaFound = "IsDevHDD(): ATA HDD found \n";
+// The disk's node: sdb, deviceNode 1.
+constexpr unsigned char kDiskNode = 1;
 
 // A column of smartctl's own temperature line, as the library's pipe sees it.
 static std::string SmartColumn(int column) {
-  return ShellOutput("smartctl -d ata -A /dev/sda | grep -i Temperature_Celsius | awk '{print $" +
+  return ShellOutput("smartctl -d ata -A /dev/sdb | grep -i Temperature_Celsius | awk '{print $" +
                      std::to_string(column) + "}'");
 }
 
 SCENARIO("disk.is_dev_hdd") {
-  // Only sda is an ATA (or USB) disk; the virtio disk sits on neither.
-  for (std::string disk : {"sda", "vda", "sdq"}) {
+  // Only sdb is a disk: the stick is on USB but small, the virtio disk sits
+  // on neither bus.
+  for (std::string disk : {"sdb", "sda", "vda", "sdq"}) {
     int found = -1;
-    CHECK_EQ(CaptureStdout([&] { found = IsDevHDD(disk.c_str()); }), disk == "sda" ? kAtaFound : "");
-    CHECK_EQ(found, disk == "sda" ? 1 : 0);
+    CHECK_EQ(CaptureStdout([&] { found = IsDevHDD(disk.c_str()); }), disk == "sdb" ? kAtaFound : "");
+    CHECK_EQ(found, disk == "sdb" ? 1 : 0);
   }
 }
 
 SCENARIO("disk.blk_dev_size") {
   unsigned long size = 0;
-  CHECK_EQ(GetBlkDevSize("sda"), 256ul << 20);
+  CHECK_EQ(GetBlkDevSize("sdb"), 256ul << 20);
+  CHECK_EQ(GetBlkDevSize("sda"), 16ul << 20);
   CHECK_EQ(GetBlkDevSize("vda"), 64ul << 20);
   CHECK_EQ(CaptureStdout([&] { size = GetBlkDevSize("sdq"); }), "Device /dev/sdq open failed \n");
   CHECK_EQ(size, ~0ul);
 }
 
 SCENARIO("disk.vendor_info") {
-  char sda[] = "sda", missing[] = "sdq";
+  char disk[] = "sdb", missing[] = "sdq";
   int rc = -2;
-  std::string text = CaptureStdout([&] { rc = GetVendorInfo(sda); });
+  std::string text = CaptureStdout([&] { rc = GetVendorInfo(disk); });
   CHECK_EQ(rc, 0);
   // ATA strings are space-padded to their field width (40 for the model).
   CHECK(text.find("Hard Disk Model: ST1000DM003-1SB102" + std::string(22, ' ') + "\n") != std::string::npos);
@@ -45,13 +49,15 @@ SCENARIO("disk.vendor_info") {
 }
 
 SCENARIO("disk.vendor_type") {
-  // sda (node 0) is a Seagate (vendor 0). sdb does not exist: hdparm finds
-  // no model, every pattern misses.
+  // The disk (node 1) is a Seagate (vendor 0). The stick (node 0) has no
+  // ATA identity and sdc does not exist: hdparm finds no model, every
+  // pattern misses.
   HardDriveNodeInfo drive{};
   unsigned int vendor = 99;
+  drive.deviceNode = kDiskNode;
   CHECK_EQ(HardDriveGetVendorType(&drive, &vendor), 1);
   CHECK_EQ(vendor, 0u);
-  for (unsigned char node : {1, 5}) {
+  for (unsigned char node : {0, 2, 5}) {
     drive.deviceNode = node;
     vendor = 99;
     CHECK_EQ(HardDriveGetVendorType(&drive, &vendor), 0);
@@ -65,7 +71,7 @@ SCENARIO("disk.node_position") {
   HardDriveNodeInfo drive{};
   unsigned int found = 0;
   CHECK_EQ(HardDriveProbeNodePosition(&drive), 1);
-  CHECK_EQ(static_cast<int>(drive.deviceNode), 0);
+  CHECK_EQ(static_cast<int>(drive.deviceNode), int(kDiskNode));
   REQUIRE(drive.scsiBus != HARD_DRIVE_BUS_UNKNOWN);
   CHECK_EQ(HardDriveProbeScsiBusPosition(drive.scsiBus, &found), 1);
   CHECK_EQ(found, drive.scsiBus);
@@ -82,6 +88,7 @@ SCENARIO("disk.temperature") {
   REQUIRE(!raw.empty() && !worst.empty() && minmax.find('/') != std::string::npos);
   const std::string current = std::to_string(std::stoi(raw)), highest = std::to_string(std::stoi(worst));
   HardDriveNodeInfo drive{};
+  drive.deviceNode = kDiskNode;
   unsigned char value = 0;
   CHECK_EQ(HardDriveGetTemperatureData(&drive, 10, &value), 1);
   CHECK_EQ(std::to_string(value), current);
@@ -101,9 +108,10 @@ SCENARIO("disk.temperature") {
   CHECK_LOG("Current Temp = " + current + "  :  High Temp = " + highest + "\n");
 }
 
-// The diagnostic loop never returns: run it in a child for one round. The
-// emulated disk answers SMART READ DATA but has no attribute 194, so the
-// round prints only the disk detection line.
+// The diagnostic loop never returns: run it in a child for one round. It
+// passes the stick over for sdb. The emulated disk answers SMART READ DATA
+// but has no attribute 194, so the round prints only the disk detection
+// line.
 SCENARIO("disk.smart_loop") {
   pid_t done = -1;
   std::string text = CaptureStdout([&] {
@@ -121,3 +129,4 @@ SCENARIO("disk.smart_loop") {
   CHECK_EQ(done, 0);
   CHECK_EQ(text, kAtaFound);
 }
+
