@@ -97,6 +97,13 @@ for s in disk.is_dev_hdd disk.blk_dev_size disk.vendor_info disk.vendor_type \
          disk.node_position disk.temperature disk.smart_loop; do
   run_guest $s
 done
+# The stick is pulled (deleted through sysfs) in the first; then a card
+# reader with an empty slot comes in on the lowest free letter (sda after
+# the stick), and the second takes the disk away for a while.
+run_guest disk.usb_stick
+if want disk.usb_empty_slot; then
+  load ehci_pci && run_guest disk.usb_empty_slot || fail disk.usb_empty_slot "ehci_pci"
+fi
 
 # ---- Flash faults ----------------------------------------------------------------------
 # DATA.A (mtd12) spans NAND blocks 96-127, pages of 2 KiB, 64 a block.

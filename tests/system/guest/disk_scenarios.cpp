@@ -1,11 +1,14 @@
 // Disk probing against the emulated AHCI disk (/dev/sdb, model
 // ST1000DM003-1SB102, serial Z9A0SYS1, 256 MiB), a USB stick on the lower
 // letter (/dev/sda, 16 MiB) and the virtio disk (/dev/vda, 64 MiB).
+#include <sched.h>
 #include <signal.h>
+#include <sys/mount.h>
 #include <sys/wait.h>
 
 #include "harness.h"
 #include "stbplat/disk.h"
+#include "stbplat/log.h"
 
 const std::string kAtaFound = "IsDevHDD(): ATA HDD found \n";
 // The disk's node: sdb, deviceNode 1.
@@ -130,3 +133,106 @@ SCENARIO("disk.smart_loop") {
   CHECK_EQ(text, kAtaFound);
 }
 
+// ---- USB storage beside the disk ----------------------------------------------
+// Debian's kernels are built without /proc/scsi/scsi, which the box's kernel
+// has and the position probe counts devices from. The scenarios below run in
+// a mount namespace of their own whose /proc holds links into the real one
+// and a device list written from sysfs in the kernel's format; WriteScsiList
+// rewrites it after every change of devices.
+static bool own_scsi_list = false;
+
+static void WriteScsiList() {
+  if (!own_scsi_list) return;
+  auto field = [](const std::string& device, const char* name) {
+    Bytes text = ReadFile("/sys/bus/scsi/devices/" + device + "/" + name);
+    return std::string(text.begin(), std::find(text.begin(), text.end(), '\n'));
+  };
+  std::string list = "Attached devices:\n", device;
+  std::istringstream devices(ShellOutput("ls /sys/bus/scsi/devices"));
+  while (devices >> device) {
+    unsigned host, channel, id, lun;
+    if (std::sscanf(device.c_str(), "%u:%u:%u:%u", &host, &channel, &id, &lun) != 4) continue;
+    char entry[256];  // every device here is a disk
+    std::snprintf(entry, sizeof entry,
+                  "Host: scsi%u Channel: %02u Id: %02u Lun: %02u\n  Vendor: %s Model: %s Rev: %s\n"
+                  "  Type:   Direct-Access                    ANSI  SCSI revision: 05\n",
+                  host, channel, id, lun, field(device, "vendor").c_str(), field(device, "model").c_str(),
+                  field(device, "rev").c_str());
+    list += entry;
+  }
+  WriteFile("/proc/scsi/scsi", Bytes(list.begin(), list.end()));
+}
+
+static bool ProvideScsiList() {
+  if (::access("/proc/scsi/scsi", F_OK) == 0) return true;  // the kernel's own
+  own_scsi_list = ::unshare(CLONE_NEWNS) == 0 &&
+                  ::mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 &&
+                  Shell("mkdir -p /tmp/kproc /tmp/procview/scsi && mount -t proc proc /tmp/kproc && "
+                        "for e in /tmp/kproc/*; do ln -sfn $e /tmp/procview/; done && "
+                        "mount --bind /tmp/procview /proc");
+  WriteScsiList();
+  return own_scsi_list;
+}
+
+// The probe's node and GetHdTemperature's reading: "sdb 31" for the disk
+// on sdb at 31 degrees, "none" and "no reading" when they find no disk, and
+// what the probe printed, if anything (it should print nothing; its log
+// messages, which this program echoes, are held back meanwhile).
+static std::string Probe() {
+  HardDriveNodeInfo drive{};
+  int found = 0, temperature = -1;
+  const unsigned int level = subSystemLogLevel[eLogModuleDiskProbing];
+  subSystemLogLevel[eLogModuleDiskProbing] = 0;
+  std::string printed = CaptureStdout([&] { found = HardDriveProbeNodePosition(&drive); });
+  subSystemLogLevel[eLogModuleDiskProbing] = level;
+  bool read = GetHdTemperature(&temperature);
+  std::string seen = found != 1 ? "none" : "sd" + std::string(1, char('a' + drive.deviceNode));
+  seen += read ? " " + std::to_string(temperature) : " no reading";
+  std::replace(printed.begin(), printed.end(), '\n', '|');
+  return printed.empty() ? seen : seen + ", printed " + printed;
+}
+
+static bool LinkHas(const std::string& node, const std::string& text) {
+  return ShellOutput("readlink /sys/class/block/" + node).find(text) != std::string::npos;
+}
+
+static std::string DiskReading() { return "sdb " + std::to_string(std::stoi(SmartColumn(10))); }
+
+SCENARIO("disk.usb_stick") {
+  REQUIRE(ProvideScsiList());
+  REQUIRE(LinkHas("sda", "/usb") && LinkHas("sdb", "/ata"));
+  const std::string disk = DiskReading();
+  CHECK_EQ(Probe(), disk);
+  // Pulled: sda is gone, the disk keeps sdb.
+  REQUIRE(Shell("echo 1 >/sys/block/sda/device/delete"));
+  WriteScsiList();
+  REQUIRE(!LinkHas("sda", "/"));
+  CHECK_EQ(Probe(), disk);
+}
+
+// The slot (removable, no medium) is no disk, even with none on ATA.
+SCENARIO("disk.usb_empty_slot") {
+  std::string slot;
+  for (int wait = 0; wait < 50 && slot.empty(); ++wait, ::usleep(200000))
+    for (std::string node : {"sda", "sdb", "sdc", "sdd", "sde"})
+      if (ReadFile("/sys/class/block/" + node + "/removable") == Bytes{'1', '\n'}) slot = node;
+  REQUIRE(!slot.empty() && GetBlkDevSize(slot.c_str()) == ~0ul && LinkHas("sdb", "/ata"));
+  REQUIRE(ProvideScsiList());
+  Info("empty card-reader slot on " + slot + ", the disk on sdb");
+  CHECK_EQ(Probe(), DiskReading());
+  // The disk taken away, then back through a rescan of its host.
+  std::string link = ShellOutput("readlink /sys/class/block/sdb");
+  std::string host = link.substr(link.find("/host") + 1);
+  host = host.substr(0, host.find('/'));
+  REQUIRE(Shell("echo 1 >/sys/block/sdb/device/delete"));
+  WriteScsiList();
+  std::string alone;
+  char took[64];
+  const double seconds = Seconds([&] { alone = Probe(); });
+  std::snprintf(took, sizeof took, "probe and reading with no disk: %.1f s", seconds);
+  Info(took);
+  CHECK_EQ(alone, "none no reading");
+  CHECK(Shell("echo '- - -' >/sys/class/scsi_host/" + host + "/scan"));
+  CHECK(Shell("for _ in $(seq 1 50); do [ -e /dev/sdb ] && exit 0; sleep 0.2; done; exit 1"));
+  CHECK(LinkHas("sdb", "/ata"));
+}
