@@ -41,7 +41,8 @@ typedef struct HardDriveNodeInfo {
 } HardDriveNodeInfo;
 
 /* Prints the model and serial number of /dev/<devName> (each cut at its
- * field's 40 and 20 characters). 0 when the device opened, else -1. A failed
+ * field's 40 and 20 characters). 0 when the device opened, else -1 (also for
+ * a null or empty name, which would open /dev/ itself). A failed
  * identity request prints " ioctl HDIO_GET_IDENTITY successful ". */
 STBPLAT_EXPORT int GetVendorInfo(char* devName);
 
@@ -77,20 +78,31 @@ STBPLAT_EXPORT int HardDriveGetTemperatureData(const HardDriveNodeInfo* drive,
  * with the columns the drive's vendor uses. A null drive or pair gives false. */
 STBPLAT_EXPORT bool HardDriveGetTemperature(const HardDriveNodeInfo* drive, unsigned int* pair);
 
-/* Finds the disk and returns its current temperature in *temperature (0 when
- * the disk was found but gave no reading). A null temperature gives false. */
+/* Finds the disk (HardDriveProbeNodePosition, so nothing is printed) and
+ * returns its current temperature in *temperature (0 when the disk was found
+ * but gave no reading). A null temperature gives false. */
 STBPLAT_EXPORT bool GetHdTemperature(int* temperature);
 
-/* Position probing. HardDriveProbeNodePosition clears the record, counts the
- * SCSI devices (a failed count only leaves scsiDeviceCount 0) and scans the
- * nodes; 1 when a disk was found. */
+/* Position probing. The probe prints nothing (IsDevHDD's texts are not
+ * shown); it logs at level 6.
+ *
+ * HardDriveProbeNodePosition clears the record, then looks for the disk:
+ * it counts the SCSI devices and scans the nodes. When that finds no ATA
+ * disk while lsmod lists a USB storage driver but no SATA driver (libata,
+ * ahci*, libahci, sata_*), the SATA driver may still be loading after USB
+ * storage took the low letters: the probe waits 1 s and looks again, at most
+ * 3 times (3 s in all). Otherwise it answers at once. 1 when a disk was
+ * found; a USB disk found on the last look is kept. */
 STBPLAT_EXPORT int HardDriveProbeNodePosition(HardDriveNodeInfo* drive);
 /* Counts the devices in /proc/scsi/scsi into scsiDeviceCount; 1 when there
  * is at least one, 0 when there is none or the list cannot be read. */
 STBPLAT_EXPORT int HardDriveProbeSataPosition(HardDriveNodeInfo* drive);
-/* Looks at sda .. sde with IsDevHDD, at most as many nodes as scsiDeviceCount
- * (all five when it is 0), and records the first disk's node and SCSI bus.
- * 1 when a disk was found. */
+/* Looks at sda .. sde in order, counting only nodes that exist (a pulled
+ * stick leaves a gap below the disk), until it has seen scsiDeviceCount of
+ * them (all five when it is 0). The first ATA disk wins; failing that, the
+ * first USB device IsDevHDD would take whose `hdparm -I` identity checksum
+ * is correct (an empty card-reader slot has none). Records its node and
+ * SCSI host; 1 when a disk was found. */
 STBPLAT_EXPORT int HardDriveScanDeviceNode(HardDriveNodeInfo* drive);
 
 #ifdef __cplusplus

@@ -6,7 +6,9 @@
 // separates name and value, or ':' when there is no '='; a line starting with
 // ':' is a directive for the directive handler. Section names keep inner
 // spaces and hold at most 49 characters. A physical line longer than 4999
-// characters is read in pieces, each counted as a line.
+// characters is read in pieces, each counted as a line and parsed as a line
+// of its own: text past character 4999 can become a setting of its own. A
+// UTF-8 byte-order mark before the first line is skipped.
 #ifndef STBPLAT_INI_READER_H
 #define STBPLAT_INI_READER_H
 
@@ -37,7 +39,9 @@ class STBPLAT_EXPORT INIReader {
   INIReader(const INIReader&) = delete;
   INIReader& operator=(const INIReader&) = delete;
 
-  // -1 when the file cannot be opened, 0 when every line was good, else the
+  // -1 when the file cannot be opened or a read fails (a directory, an I/O
+  // error part-way: what was parsed before still reached the handler), 0
+  // when every line was good, else the
   // number (from 1) of the first bad line; a line with no '=' or ':' is the
   // exception: it becomes the error line even after an earlier bad line.
   // Bad lines are reported on standard output and do not stop the parse.
@@ -51,7 +55,8 @@ class STBPLAT_EXPORT INIReader {
   char* FindFirstNonWhitespace(const char* s);
   // First c, or first ';' right after whitespace, or the terminator.
   char* FindCharOrComment(const char* s, char c);
-  // strncpy of size bytes, always terminated within them; returns dst.
+  // strncpy of size bytes, always terminated within them (size 0 writes
+  // nothing); returns dst.
   char* strncpy0(char* dst, const char* src, unsigned long size);
 };
 

@@ -3,9 +3,11 @@
 // minor version 6; both layouts are read, decided by the minor version in
 // the record's own header, and the new one is always written.
 //
-// A minor-5 controller or segment is converted as it is read: minorVer then
-// says 6, the layout the record holds and stores, so that what a store
-// writes reads back to the same controller and segments.
+// A minor-5 controller or segment is converted as it is read (sizes to MiB)
+// and keeps minorVer 5, so a program can tell an old record from a new one.
+// A store writes the minor-6 layout under a minor-6 header (the common
+// header's writer raises the minor version of these two types to 6), so
+// what a store writes reads back to the same controller and segments.
 // A failing segment is removed from its controller's list again; a failing
 // controller stays in the configuration's list as its read left it.
 // Safe edges on corrupt input: element counts are trusted only as far as

@@ -49,8 +49,6 @@ unsigned int MemoryControllerDescriptor::Read(Extruder& in, unsigned int) {
     // as not valid.
     ddrCfgWidth = ddrSize = ddrSpeed = ddrDevTech = ddrMode = ddrDevWidth = 0;
     valid = false;
-    // What the record holds now has the new layout, and is stored so.
-    minorVer = kMemoryLayoutMinorVersion;
     return kDescriptorOk;
   }
   if (!Extruded(in.extrude(&ddrCfgWidth))) {

@@ -28,8 +28,6 @@ unsigned int MemoryControllerSegmentDescriptor::Read(Extruder& in, unsigned int)
   }
   if (minorVer < kMemoryLayoutMinorVersion) {
     segmentSize >>= kBytesToMiBShift;
-    // What the record holds now has the new layout, and is stored so.
-    minorVer = kMemoryLayoutMinorVersion;
   }
   return kDescriptorOk;
 }

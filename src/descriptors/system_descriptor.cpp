@@ -2,6 +2,7 @@
 #include "stbplat/system_descriptor.h"
 
 #include "descriptors/record_io.h"
+#include "stbplat/memory_config.h"
 
 using namespace stbplat::records;
 
@@ -87,6 +88,19 @@ unsigned int SystemDescriptor::ReadBase(Extruder& in) {
   return kDescriptorOk;
 }
 
+namespace {
+
+// Controllers and segments are held, and always written, in the layout of
+// minor version 6, whatever minor version they were read with: their header
+// says so, while minorVer keeps telling what was read.
+unsigned char StoredMinorVersion(unsigned int entryType, unsigned char minorVer) {
+  const bool memoryLayout = entryType == kEntryTypeMCSD || entryType == kEntryTypeMCET;
+  const unsigned char layout = kMemoryLayoutMinorVersion;
+  return memoryLayout && minorVer < layout ? layout : minorVer;
+}
+
+}  // namespace
+
 unsigned int SystemDescriptor::StoreBase(Intruder* out) const {
   if (!Intruded(out->intrude(flags))) {
     RECORD_ERROR("StoreBase", "Error writing flags\r\n");
@@ -96,7 +110,7 @@ unsigned int SystemDescriptor::StoreBase(Intruder* out) const {
     RECORD_ERROR("StoreBase", "Error writing majorVer\r\n");
     return kDescriptorFieldError;
   }
-  if (!Intruded(out->intrude(minorVer))) {
+  if (!Intruded(out->intrude(StoredMinorVersion(entryType, minorVer)))) {
     RECORD_ERROR("StoreBase", "Error writing minorVer\r\n");
     return kDescriptorFieldError;
   }

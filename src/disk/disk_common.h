@@ -40,6 +40,18 @@ void DevicePath(char (&out)[kPathSize], const char* prefix, const char* name);
 // False when there is no such link.
 bool ReadBlockDeviceLink(const char* name, char (&link)[kLinkSize]);
 
+// What IsDevHDD decides about a block device: an ATA disk, a USB device
+// above 256 GiB (or whose size cannot be read), or neither.
+enum class BlockKind { kOther, kAta, kUsbDisk };
+
+// The size of /dev/<name> in bytes, or all bits set. Quiet prints nothing;
+// otherwise GetBlkDevSize's texts.
+unsigned long BlockDeviceSize(const char* name, bool quiet);
+
+// Classifies a device whose /sys/class/block link is `link`. Quiet prints
+// nothing; otherwise IsDevHDD's texts.
+BlockKind ClassifyBlockDevice(const char* name, const char* link, bool quiet);
+
 }  // namespace disk
 }  // namespace stbplat
 

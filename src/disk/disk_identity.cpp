@@ -64,6 +64,37 @@ void PrintTemperatureAttributes(const unsigned char* data) {
 }
 
 }  // namespace
+
+unsigned long BlockDeviceSize(const char* name, bool quiet) {
+  constexpr unsigned long kFailed = static_cast<unsigned long>(-1);
+  char path[kPathSize];
+  DevicePath(path, kDevPrefix, name);
+  os::ScopedFd fd(os::Sys().open(path, O_RDONLY, 0));
+  if (!fd.valid()) {
+    if (!quiet) std::printf("Device %s open failed \n", path);
+    return kFailed;
+  }
+  unsigned long long size = 0;
+  if (os::Sys().ioctl(fd.get(), kBlkGetSize64, &size) == -1) {
+    if (!quiet) std::puts(" Get block dev size failed ");
+    return kFailed;
+  }
+  return static_cast<unsigned long>(size);
+}
+
+BlockKind ClassifyBlockDevice(const char* name, const char* link, bool quiet) {
+  if (std::strstr(link, "ata") != nullptr) {
+    if (!quiet) std::puts("IsDevHDD(): ATA HDD found ");
+    return BlockKind::kAta;
+  }
+  // Unsigned on purpose: a USB device whose size cannot be read counts.
+  if (std::strstr(link, "usb") != nullptr && BlockDeviceSize(name, quiet) > kUsbDiskThreshold) {
+    if (!quiet) std::puts("Ext USB HDD detected ");
+    return BlockKind::kUsbDisk;
+  }
+  return BlockKind::kOther;
+}
+
 }  // namespace disk
 }  // namespace stbplat
 
@@ -74,6 +105,11 @@ namespace disk = stbplat::disk;
 extern "C" {
 
 int GetVendorInfo(char* devName) {
+  // No name would open the /dev/ directory itself.
+  if (devName == nullptr || devName[0] == '\0') {
+    std::puts("ERROR: Cannot open device ");
+    return -1;
+  }
   char path[disk::kPathSize];
   disk::DevicePath(path, disk::kDevPrefix, devName);
   ScopedFd fd(Sys().open(path, O_RDONLY | O_NONBLOCK, 0));
@@ -96,35 +132,13 @@ int GetVendorInfo(char* devName) {
 }
 
 unsigned long GetBlkDevSize(const char* devName) {
-  constexpr unsigned long kFailed = static_cast<unsigned long>(-1);
-  char path[disk::kPathSize];
-  disk::DevicePath(path, disk::kDevPrefix, devName);
-  ScopedFd fd(Sys().open(path, O_RDONLY, 0));
-  if (!fd.valid()) {
-    std::printf("Device %s open failed \n", path);
-    return kFailed;
-  }
-  unsigned long long size = 0;
-  if (Sys().ioctl(fd.get(), disk::kBlkGetSize64, &size) == -1) {
-    std::puts(" Get block dev size failed ");
-    return kFailed;
-  }
-  return static_cast<unsigned long>(size);
+  return disk::BlockDeviceSize(devName, false);
 }
 
 int IsDevHDD(const char* devName) {
   char link[disk::kLinkSize];
   if (!disk::ReadBlockDeviceLink(devName, link)) return 0;
-  if (std::strstr(link, "ata") != nullptr) {
-    std::puts("IsDevHDD(): ATA HDD found ");
-    return 1;
-  }
-  // Unsigned on purpose: a USB device whose size cannot be read counts.
-  if (std::strstr(link, "usb") != nullptr && GetBlkDevSize(devName) > disk::kUsbDiskThreshold) {
-    std::puts("Ext USB HDD detected ");
-    return 1;
-  }
-  return 0;
+  return disk::ClassifyBlockDevice(devName, link, false) != disk::BlockKind::kOther ? 1 : 0;
 }
 
 int GetHDDTemperature(void) {

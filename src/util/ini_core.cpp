@@ -14,6 +14,9 @@ constexpr char kSectionOpen = '[';
 constexpr char kSectionClose = ']';
 constexpr char kSeparator = '=';
 constexpr char kSecondSeparator = ':';
+// Editors on other systems start a UTF-8 file with a byte-order mark.
+constexpr char kUtf8Bom[] = "\xEF\xBB\xBF";
+constexpr size_t kUtf8BomLength = sizeof kUtf8Bom - 1;
 
 bool IsSpace(char c) { return std::isspace(static_cast<unsigned char>(c)) != 0; }
 
@@ -52,6 +55,7 @@ char* FindCharOrComment(const char* s, char c) {
 }
 
 char* strncpy0(char* dst, const char* src, unsigned long size) {
+  if (size == 0) return dst;  // no room even for the terminator
   std::strncpy(dst, src, size);
   dst[size - 1] = '\0';
   return dst;
@@ -70,7 +74,10 @@ int ParseLines(LineSource nextLine, void* context, ValueHandler valueHandler,
 
   while (nextLine(lineBuffer, bufferSize, context) != nullptr) {
     ++lineNumber;
-    char* p = FindFirstNonWhitespace(StripWhitespacesAtEnd(lineBuffer));
+    char* line = lineBuffer;
+    if (lineNumber == 1 && std::strncmp(line, kUtf8Bom, kUtf8BomLength) == 0)
+      line += kUtf8BomLength;
+    char* p = FindFirstNonWhitespace(StripWhitespacesAtEnd(line));
 
     if (*p == kCommentChar || *p == kHashComment || *p == '\0') continue;
 

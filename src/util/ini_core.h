@@ -4,7 +4,8 @@
 // compiled into both libraries. Every symbol here is internal (hidden).
 //
 // Syntax, one physical line at a time (a line longer than the buffer arrives
-// in pieces, each counted as a line):
+// in pieces, each counted as a line and parsed on its own); a UTF-8
+// byte-order mark at the start of the first line is skipped:
 //   ; comment   # comment        whole-line comments
 //   [section]                    section name kept verbatim, at most 49 chars
 //   name = value ; note          '=' or, failing that, ':' separates
@@ -43,7 +44,8 @@ char* FindFirstNonWhitespace(const char* s);
 // First c, or first ';' directly after a whitespace character, or the
 // terminator, whichever comes first. A ';' at the start of s is plain text.
 char* FindCharOrComment(const char* s, char c);
-// strncpy of size bytes, then dst[size - 1] = 0; returns dst.
+// strncpy of size bytes, then dst[size - 1] = 0; returns dst. Size 0 writes
+// nothing.
 char* strncpy0(char* dst, const char* src, unsigned long size);
 
 // Parses lines from nextLine(buffer, bufferSize, context) until it returns

@@ -45,9 +45,16 @@ int INIReader::Parse() {
     std::printf("Unable to open ini file %s\r\n", fileName != nullptr ? fileName : "(null)");
     return -1;
   }
-  return stbplat::ini::ParseLines(ReadLineThroughSeam, file.get(), valueHandler,
-                                  directiveHandler, user, fileName, lineBuffer,
-                                  stbplat::ini::kLineBufferSize);
+  const int errorLine = stbplat::ini::ParseLines(ReadLineThroughSeam, file.get(), valueHandler,
+                                                 directiveHandler, user, fileName, lineBuffer,
+                                                 stbplat::ini::kLineBufferSize);
+  // fgets ends the same way at the end and on a read error: only the stream
+  // tells them apart.
+  if (stbplat::os::Sys().ferror(file.get()) != 0) {
+    std::printf("Unable to read ini file %s\r\n", fileName);
+    return -1;
+  }
+  return errorLine;
 }
 
 void INIReader::SetDirectiveHandler(DirectiveHandler handler) { directiveHandler = handler; }

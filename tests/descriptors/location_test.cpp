@@ -88,6 +88,13 @@ TEST(CodeObjectInfo, CountsTheRecordCannotHoldOrTheStreamEndsBefore) {
   Intruder out(4096u, 0u);
   EXPECT_EQ(info.Store(&out), 0xA004u);
   EXPECT_EQ(out.pCurrent, out.pStart);
+  Bytes full = PackageHeaderWire(16);  // as many as the record holds
+  for (unsigned long i = 2; i < 16; ++i) Put(full, "KRNL", "NAND0...KERNEL..A.......", i);
+  In in3(full);
+  EXPECT_EQ(info.Read(in3), 0u);
+  EXPECT_EQ(info.Store(&out), 0u);
+  EXPECT_EQ(info.componentLocations[15].slotOffset, 15u);
+  EXPECT_EQ(static_cast<size_t>(out.pCurrent - out.pStart), full.size());
 }
 
 TEST(Display, ComponentAndReloadErrorLinesAndTheirIndentClamp) {

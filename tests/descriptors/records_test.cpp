@@ -169,6 +169,8 @@ TEST(MemoryConfig, GoldenLayoutsOldSizesInMiBStoredInTheCurrentOne) {
   ReadWhole(old, Golden("mcfg_minor5.bin"));
   const MemoryControllerDescriptor& o = old.memoryControllers.at(0);
   EXPECT_FALSE(o.valid) << "no DDR settings in the old layout";
+  EXPECT_EQ(o.minorVer, 5);  // an old record is still told apart
+  EXPECT_EQ(o.memorySegments.at(0).minorVer, 5);
   Bytes payload(12, 0);
   Append(payload, {0, 2});
   Append(payload, Entry("MCSD", {0, 0, 0, 0, 0x40, 0, 0, 0, 0, 0, 1, 0}, 0, 6));  // 0x10000000 bytes

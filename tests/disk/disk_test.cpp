@@ -1,8 +1,7 @@
 // The disk probes over the simulated machine: identity, size, disk
 // detection and the SMART loop, which print; then the probes that log: where
-// the disk sits (the SCSI device count, the scan of sda .. sde, the SCSI
-// generic bus), its vendor asked of hdparm, and its temperature read from
-// smartctl's pipe.
+// the disk sits, the SCSI generic bus, the vendor asked of hdparm and the
+// temperature read from smartctl's pipe.
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -24,28 +23,39 @@ const std::string kError = "\n\r[ErrorMsg] [";
 
 std::string Column(int column) { return "{print $" + std::to_string(column) + "}"; }
 
+template <typename Call>
+std::string Printed(Call call) {
+  testing::internal::CaptureStdout();
+  call();
+  return testing::internal::GetCapturedStdout();
+}
+
 TEST(GetVendorInfo, FieldsAtTheirOffsetsCutToTheirWidths) {
   FakeSystem sys;
   std::string identity(512, '#');
-  identity.replace(20, 8, "Z1E6ABCD");
-  identity.replace(54, 18, "ST2000DM001-1CH164");
+  identity.replace(20, 8, "Z1E6ABCD").replace(54, 18, "ST2000DM001-1CH164");
   sys.devices["/dev/sda"].identity = identity;
   sys.devices["/dev/sdb"];  // answers no identity request
-  char sda[] = "sda", sdb[] = "sdb", sdx[] = "sdx";
-  testing::internal::CaptureStdout();
-  EXPECT_EQ(GetVendorInfo(sda), 0);
-  EXPECT_EQ(GetVendorInfo(sdb), 0);  // the failure message reads "successful", as it always has
-  EXPECT_EQ(GetVendorInfo(sdx), -1);
-  EXPECT_EQ(testing::internal::GetCapturedStdout(),
-            "Hard Disk Model: ST2000DM001-1CH164" + std::string(22, '#') +
-                "\n  Serial Number: Z1E6ABCD" + std::string(12, '#') +
-                "\n ioctl HDIO_GET_IDENTITY successful \nERROR: Cannot open device \n");
+  sys.devices["/dev/"];     // what an empty name would open
+  char sda[] = "sda", sdb[] = "sdb", sdx[] = "sdx", empty[] = "";
+  std::vector<int> results;
+  const std::string printed = Printed([&] {
+    for (char* name : {sda, sdb, sdx, empty, static_cast<char*>(nullptr)})
+      results.push_back(GetVendorInfo(name));
+  });
+  EXPECT_EQ(results, (std::vector<int>{0, 0, -1, -1, -1}));
+  const std::string cannotOpen = "ERROR: Cannot open device \n";
+  // The failure message reads "successful", as it always has.
+  EXPECT_EQ(printed, "Hard Disk Model: ST2000DM001-1CH164" + std::string(22, '#') +
+                         "\n  Serial Number: Z1E6ABCD" + std::string(12, '#') +
+                         "\n ioctl HDIO_GET_IDENTITY successful \n" + cannotOpen + cannotOpen +
+                         cannotOpen);
 }
 
 TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
   struct Row {
     std::string link;
-    long long size;    // negative: the size request fails
+    long long size;  // negative: the size request fails
     int result;
     std::string output;
   };
@@ -62,11 +72,10 @@ TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
     FakeSystem sys;
     sys.links["sdb"] = row.link;
     sys.devices["/dev/sdb"].size = row.size;
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(IsDevHDD("sdb"), row.result);
-    EXPECT_EQ(testing::internal::GetCapturedStdout(), row.output);
-    // Only a USB device's size is asked for.
-    EXPECT_EQ(sys.opened.size(), row.link == kUsbLink ? 1u : 0u);
+    int result = -1;
+    EXPECT_EQ(Printed([&] { result = IsDevHDD("sdb"); }), row.output);
+    EXPECT_EQ(result, row.result);
+    EXPECT_EQ(sys.opened.size(), row.link == kUsbLink ? 1u : 0u);  // only USB sizes are asked
   }
 }
 
@@ -95,35 +104,93 @@ TEST(GetHDDTemperature, PrintsTheTemperatureEntryEveryTenSeconds) {
   EXPECT_EQ(sys.lastDriveCommand, (std::array<unsigned char, 4>{0xB0, 0, 0xD0, 1}));
 }
 
-TEST(HardDriveProbeNodePosition, CountsListedDevicesScansNoMoreNodesAndFindsTheHost) {
+// Nodes sda .. sde as one letter each: '-' absent, 'a' an ATA disk, 's' a
+// small USB stick, 'U' a large USB disk whose identity checksum is right, 'r'
+// an empty card-reader slot (USB, does not open, no identity).
+void Attach(FakeSystem& sys, const std::string& nodes) {
+  for (size_t i = 0; i < nodes.size(); ++i) {
+    const std::string name = std::string("sd") + static_cast<char>('a' + i), path = "/dev/" + name;
+    if (nodes[i] == '-') continue;
+    sys.links[name] = nodes[i] == 'a' ? kAtaLink : kUsbLink;
+    if (nodes[i] == 's' || nodes[i] == 'U')
+      sys.devices[path].size = 1LL << (nodes[i] == 's' ? 33 : 40);
+    sys.pipes.push_back({"hdparm -I " + path + " ", nodes[i] == 'U' ? "1\n" : "0\n"});
+  }
+}
+
+TEST(HardDriveProbeNodePosition, FindsTheDiskWhateverSitsBeforeItQuietly) {
+  struct Row {
+    const char* what;
+    unsigned int listed;  // devices in /proc/scsi/scsi; 0: no list
+    std::string nodes, lsmod, lateNodes;  // lateNodes: what the first wait brings
+    int node;  // -1: not found
+    unsigned int bus;  // the host in the link: 0 for the ATA disk, 6 for USB
+    size_t waits;
+  };
+  const std::string usbOnly = "Module  Size  Used by\nusb_storage 77824 0\nsd_mod 1 2\n";
+  const unsigned int none = HARD_DRIVE_BUS_UNKNOWN;
+  const Row rows[] = {
+      {"a stick pulled from sda", 1, "-a", "", "", 1, 0, 0},
+      {"an empty card reader before the disk", 2, "ra", "", "", 1, 0, 0},
+      {"only the card reader", 1, "r", "", "", -1, none, 0},
+      {"a large USB disk", 1, "U", "", "", 0, 6, 0},
+      {"an ATA disk wins over an earlier USB disk", 2, "Ua", "", "", 1, 0, 0},
+      {"the list bounds the nodes looked at", 1, "sa", "", "", -1, none, 0},
+      {"no list: every node", 0, "----a", "", "", 4, 0, 0},
+      {"the SATA driver loads after USB storage", 1, "s", usbOnly, "sa", 1, 0, 1},
+      {"it never comes", 1, "U", usbOnly, "", 0, 6, 3},
+      {"it is loaded", 1, "s", usbOnly + "ahci 1 0\n", "", -1, none, 0},
+      {"a name that only starts like a module", 1, "s", "usb_storage_x 1 0\n", "", -1, none, 0},
+  };
+  for (const Row& row : rows) {
+    SCOPED_TRACE(row.what);
+    FakeSystem sys;
+    auto list = [&](size_t devices) {
+      std::string& text = sys.files["/proc/scsi/scsi"] = "Attached devices:\n";
+      for (size_t i = 0; i < devices; ++i) text += "Host: scsi0 Channel: 00\n";
+    };
+    if (row.listed != 0) list(row.listed);
+    Attach(sys, row.nodes);
+    sys.pipes.push_back({"lsmod", row.lsmod});
+    sys.sleepsLeft = 10;
+    sys.onSleep = [&] {
+      if (!row.lateNodes.empty()) list(row.lateNodes.size());
+      Attach(sys, row.lateNodes);
+    };
+    HardDriveNodeInfo drive;
+    int found = -1;
+    EXPECT_EQ(Printed([&] { found = HardDriveProbeNodePosition(&drive); }), "");
+    EXPECT_EQ(found, row.node >= 0 ? 1 : 0);
+    EXPECT_EQ(drive.deviceNode, row.node >= 0 ? row.node : HARD_DRIVE_NODE_COUNT);
+    EXPECT_EQ(drive.scsiBus, row.bus);
+    EXPECT_EQ(sys.sleeps, std::vector<unsigned int>(row.waits, 1));
+  }
+}
+
+TEST(HardDriveProbeNodePosition, ListReadInPiecesHostNumbersAndMessages) {
   FakeSystem sys;
   HardDriveNodeInfo drive;
   std::memset(&drive, 0xEE, sizeof drive);
   LogCapture log;
-  EXPECT_EQ(HardDriveProbeNodePosition(&drive), 0);  // no list: all five nodes looked at
+  EXPECT_EQ(HardDriveProbeNodePosition(&drive), 0);
   const HardDriveNodeInfo cleared{0, HARD_DRIVE_BUS_UNKNOWN, HARD_DRIVE_NODE_COUNT, {}};
   EXPECT_EQ(std::memcmp(&drive, &cleared, sizeof drive), 0);
-  EXPECT_EQ(HardDriveProbeSataPosition(&drive), 0);
   // The first entry's line is read in pieces of 255; the next piece starts with "Host:".
   sys.files["/proc/scsi/scsi"] = "Attached devices:\nHost: scsi0 " + std::string(243, 'x') +
                                  "Host: scsi9\nHost: scsi1 Channel: 00\n";
-  sys.links["sda"] = kUsbLink;  // a small stick
-  sys.devices["/dev/sda"].size = 8LL << 30;
-  // Only a "/hostN/" component below 2^32 - 1 names the host.
-  sys.links["sdc"] = "../../devices/hostx/host7x/host4294967295/ata3/host12/target12:0:0/block/sdc";
   EXPECT_EQ(HardDriveProbeSataPosition(&drive), 1);
   EXPECT_EQ(drive.scsiDeviceCount, 2u);
-  EXPECT_EQ(HardDriveScanDeviceNode(&drive), 0);  // sdc lies beyond the two devices listed
+  // Only a "/hostN/" component below 2^32 - 1 names the host.
+  sys.links["sdc"] = "../../devices/hostx/host7x/host4294967295/ata3/host12/target12:0:0/block/sdc";
   sys.files["/proc/scsi/scsi"] = "Attached devices:\n";
   EXPECT_EQ(HardDriveProbeSataPosition(&drive), 0);
-  EXPECT_EQ(HardDriveScanDeviceNode(&drive), 1);  // every node again
+  EXPECT_EQ(HardDriveScanDeviceNode(&drive), 1);
   EXPECT_EQ(drive.deviceNode, 2);
   EXPECT_EQ(drive.scsiBus, 12u);
   const std::string sata = kError + "HardDriveProbeSataPosition] ";
-  const std::string notFound = kError + "HardDriveScanDeviceNode] Hard Drive Not Found\n\r";
-  const std::string noList = sata + "Failed To Open /proc/scsi/scsi\n\r";
-  EXPECT_EQ(log.texts(),
-            (Texts{noList, notFound, noList, notFound, sata + "No Scsi Device Attached\n\r"}));
+  EXPECT_EQ(log.texts(), (Texts{sata + "Failed To Open /proc/scsi/scsi\n\r",
+                                kError + "HardDriveScanDeviceNode] Hard Drive Not Found\n\r",
+                                sata + "No Scsi Device Attached\n\r"}));
   EXPECT_EQ(log.messages()[0].module, 18);
   EXPECT_EQ(log.messages()[0].level, 6u);
   EXPECT_EQ(log.messages()[0].sourceFile, "HardDriveTempUtils");
@@ -144,93 +211,100 @@ TEST(HardDriveProbeScsiBusPosition, BusAmongTheGenericDevices) {
   const std::string probe = kError + "HardDriveProbeScsiBusPosition] ";
   EXPECT_EQ(log.texts(), (Texts{probe + "Scsi Device7 Bus3 Not Found\n\r",
                                 probe + "Failed On SCSI_IOCTL_GET_BUS_NUMBER\n\r"}));
-  EXPECT_EQ(sys.opened, (Texts{"/dev/sg0", "/dev/sg1", "/dev/sg2", "/dev/sg0", "/dev/sg1",
-                               "/dev/sg2", "/dev/sg3", "/dev/sg4", "/dev/sg0"}));
+  EXPECT_EQ(sys.opened.size(), 9u);  // sg0 .. sg2, then all five, then sg0
 }
 
-TEST(HardDriveGetVendorType, FirstPatternHdparmCountsAndEachPipeFailure) {
-  FakeSystem sys;
-  sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}};
-  HardDriveNodeInfo sdd{0, 0, 3, {}};
-  unsigned int vendor = 99;
-  EXPECT_EQ(HardDriveGetVendorType(&sdd, &vendor), 1);
-  EXPECT_EQ(vendor, 3u);
-  EXPECT_EQ(sys.commands.size(), 4u);  // the vendors' columns below prove the patterns' order
-  EXPECT_EQ(sys.commands.back(), "hdparm -i /dev/sdd 2>/dev/null | grep -i -c Model=To");
-  LogCapture log;
-  HardDriveNodeInfo sda{};
-  sys.pipes.clear();
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);  // hdparm prints nothing
-  sys.pipeCloseFails = true;
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);
-  sys.pipes = {{"Model=ST", "1\n"}};
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);  // a match is lost with its pipe
-  EXPECT_EQ(vendor, 4u);
-  sys.pipeOpenFails = true;
-  EXPECT_EQ(HardDriveGetVendorType(&sda, &vendor), 0);
+// The pipe-reading probes: each row sets up hdparm's and smartctl's output,
+// makes one call, and checks its result and messages.
+TEST(PipeProbes, VendorAndReadingsOrTheFailureOfEachStep) {
   const std::string type = kError + "HardDriveGetVendorType] ";
-  const std::string closeFailed = type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r";
-  EXPECT_EQ(log.texts(), (Texts{type + "Scan Model Failed\n\r", type + "Scan Model Failed\n\r",
-                                closeFailed, closeFailed,
-                                type + "Failed To Open The Pipe-Hdparm Node[/dev/sda]\n\r"}));
-  EXPECT_EQ(HardDriveGetVendorType(nullptr, &vendor), 0);
-}
-
-TEST(HardDriveGetTemperatureData, OneReadingOrTheFailureOfEachStep) {
-  FakeSystem sys;
-  sys.pipes = {{Column(5), "300\n"}, {Column(4), "1234\n"}, {Column(12), "21\n"}};
-  HardDriveNodeInfo sda{}, sde{0, 0, 4, {}}, sdf{0, 0, 5, {}};
-  unsigned char value = 0;
-  LogCapture log;
-  EXPECT_EQ(HardDriveGetTemperatureData(&sde, 5, &value), 1);
-  EXPECT_EQ(value, 300 & 0xFF);  // kept in 8 bits
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 4, &value), 1);
-  EXPECT_EQ(value, 123);  // three digits at most
-  EXPECT_EQ(sys.commands[0],
-            "smartctl -d ata -A /dev/sde | grep -i Temperature_Celsius | awk '{print $5}' ");
-  // Refused before any command runs.
-  EXPECT_EQ(HardDriveGetTemperatureData(&sdf, 10, &value), 0);
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 10, nullptr), 0);
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 12, &value), 0);  // no "/max)"
-  sys.pipeCloseFails = true;
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 10, &value), 0);  // nothing printed
-  EXPECT_EQ(value, 123);
-  EXPECT_EQ(HardDriveGetTemperatureData(&sde, 5, &value), 0);
-  EXPECT_EQ(value, 44);  // stored before the close failed
-  sys.pipeOpenFails = true;
-  EXPECT_EQ(HardDriveGetTemperatureData(&sda, 5, &value), 0);
   const std::string data = kError + "HardDriveGetTemperatureData] ";
-  const std::string scanFailed = data + "Scan Data Failed\n\r";
-  EXPECT_EQ(log.texts(), (Texts{data + "Failed To Input Wrong Device Node Number (5)\n\r",
-                                data + "pData : Null Pointer Assignment\n\r", scanFailed, scanFailed,
-                                data + "Failed To Close The Pipe-Smartctl Node[/dev/sda]\n\r",
-                                data + "Failed To Close The Pipe-Smartctl Node[/dev/sde]\n\r",
-                                data + "Failed To Open The Pipe-Smartctl Node[/dev/sda]\n\r"}));
+  struct Row {
+    unsigned char node, column;  // column 0: ask for the vendor
+    std::vector<std::pair<std::string, std::string>> pipes;
+    bool openFails, closeFails;
+    int result, value;  // the vendor or the reading
+    Texts log;
+  };
+  const Row rows[] = {
+      {4, 0, {{"-c Model=To", "1\n"}, {"grep", "0\n"}}, false, false, 1, 3, {}},
+      {5, 0, {}, false, false, 0, 4, {type + "Failed To Input Wrong Device Node Number (5)\n\r"}},
+      {0, 0, {}, false, false, 0, 4, {type + "Scan Model Failed\n\r"}},  // hdparm prints nothing
+      {0, 0, {}, false, true, 0, 4,
+       {type + "Scan Model Failed\n\r", type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      // A match is lost with its pipe.
+      {0, 0, {{"Model=ST", "1\n"}}, false, true, 0, 4,
+       {type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      {0, 0, {}, true, false, 0, 4, {type + "Failed To Open The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      {4, 5, {{Column(5), "300\n"}}, false, false, 1, 300 & 0xFF, {}},  // kept in 8 bits
+      {0, 4, {{Column(4), "1234\n"}}, false, false, 1, 123, {}},        // three digits at most
+      {0, 12, {{Column(12), "21/47)\n"}}, false, false, 1, 47, {}},
+      // Refused before any command runs.
+      {5, 10, {}, false, false, 0, 0, {data + "Failed To Input Wrong Device Node Number (5)\n\r"}},
+      {0, 13, {}, false, false, 0, 0, {data + "Failed To Input Wrong Offset (13)\n\r"}},
+      {0, 12, {{Column(12), "21\n"}}, false, false, 0, 0, {data + "Scan Data Failed\n\r"}},
+      {0, 10, {}, false, true, 0, 0,
+       {data + "Scan Data Failed\n\r", data + "Failed To Close The Pipe-Smartctl Node[/dev/sda]\n\r"}},
+      // Stored before the close failed.
+      {4, 5, {{Column(5), "44\n"}}, false, true, 0, 44,
+       {data + "Failed To Close The Pipe-Smartctl Node[/dev/sde]\n\r"}},
+      {0, 5, {}, true, false, 0, 0, {data + "Failed To Open The Pipe-Smartctl Node[/dev/sda]\n\r"}},
+  };
+  Texts lastCommands;
+  for (const Row& row : rows) {
+    SCOPED_TRACE(std::to_string(row.node) + " " + std::to_string(row.column));
+    FakeSystem sys;
+    sys.pipes = row.pipes;
+    sys.pipeOpenFails = row.openFails;
+    sys.pipeCloseFails = row.closeFails;
+    HardDriveNodeInfo drive{0, 0, row.node, {}};
+    unsigned int vendor = 99;
+    unsigned char value = 0;
+    LogCapture log;
+    EXPECT_EQ(row.column == 0 ? HardDriveGetVendorType(&drive, &vendor)
+                              : HardDriveGetTemperatureData(&drive, row.column, &value),
+              row.result);
+    EXPECT_EQ(row.column == 0 ? static_cast<int>(vendor) : value, row.value);
+    EXPECT_EQ(log.texts(), row.log);
+    lastCommands.push_back(sys.commands.empty() ? "" : sys.commands.back());
+    if (&row == rows) {
+      EXPECT_EQ(sys.commands.size(), 4u);  // the vendor columns prove the patterns' order
+    }
+  }
+  EXPECT_EQ(lastCommands[0], "hdparm -i /dev/sde 2>/dev/null | grep -i -c Model=To");
+  EXPECT_EQ(lastCommands[6],
+            "smartctl -d ata -A /dev/sde | grep -i Temperature_Celsius | awk '{print $5}' ");
+  unsigned int vendor = 0;
+  unsigned char value = 0;
+  HardDriveNodeInfo sda{};
+  EXPECT_EQ(HardDriveGetVendorType(nullptr, &vendor) + HardDriveGetTemperatureData(nullptr, 10, &value) +
+                HardDriveGetTemperatureData(&sda, 10, nullptr), 0);
 }
 
-TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
+TEST(HardDriveGetTemperature, EachVendorsColumnsInOrderAndPair) {
   struct Row {
     const char* model;
-    Texts columns;  // what awk prints for columns 4, 5, 10 and 12
+    Texts columns;      // what awk prints for columns 4, 5, 10 and 12
+    std::string asked;  // the columns asked for, in order
     bool result;
     unsigned int current, highest;
   };
   const Row rows[] = {
-      {"ST", {"", "53", "36", ""}, true, 36, 53},
-      {"WD", {"100", "98", "40", ""}, true, 40, 42},
-      {"WD", {"90", "100", "5", ""}, true, 5, 5u - 10u},  // worked out wide, kept in 32 bits
-      {"Hi", {"", "", "35", "21/47)"}, true, 35, 47},
-      {"To", {"", "", "38", "15/52)"}, true, 38, 52},
+      {"ST", {"", "53", "36", ""}, "5 10", true, 36, 53},
+      {"WD", {"100", "98", "40", ""}, "4 5 10", true, 40, 42},
+      {"WD", {"90", "100", "5", ""}, "4 5 10", true, 5, 5u - 10u},  // worked out wide, 32 bits
+      {"Hi", {"", "", "35", "21/47)"}, "12 10", true, 35, 47},
+      {"To", {"", "", "38", "15/52)"}, "12 10", true, 38, 52},
       // The first failed reading ends it with a zero pair.
-      {"WD", {"", "98", "40", ""}, false, 0, 0},
-      {"WD", {"100", "", "40", ""}, false, 0, 0},
-      {"WD", {"100", "98", "", ""}, false, 0, 0},
-      {"ST", {"", "53", "", ""}, false, 0, 0},
-      {"Hi", {"", "", "35", ""}, false, 0, 0},
-      {"XX", {"", "53", "36", ""}, false, 7, 7},  // no vendor: the pair is left alone
+      {"WD", {"", "98", "40", ""}, "4", false, 0, 0},
+      {"WD", {"100", "", "40", ""}, "4 5", false, 0, 0},
+      {"WD", {"100", "98", "", ""}, "4 5 10", false, 0, 0},
+      {"ST", {"", "53", "", ""}, "5 10", false, 0, 0},
+      {"Hi", {"", "", "35", ""}, "12", false, 0, 0},
+      {"XX", {"", "53", "36", ""}, "", false, 7, 7},  // no vendor: the pair is left alone
   };
   for (const Row& row : rows) {
-    SCOPED_TRACE(std::string(row.model) + " " + std::to_string(row.current));
+    SCOPED_TRACE(std::string(row.model) + " " + row.asked);
     FakeSystem sys;
     sys.pipes = {{std::string("-c Model=") + row.model, "1\n"}, {"grep -i -c", "0\n"},
                  {Column(4), row.columns[0]}, {Column(5), row.columns[1]},
@@ -238,8 +312,14 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsAndPair) {
     HardDriveNodeInfo drive{};
     unsigned int pair[2] = {7, 7};
     EXPECT_EQ(HardDriveGetTemperature(&drive, pair), row.result);
-    EXPECT_EQ(pair[0], row.current);
-    EXPECT_EQ(pair[1], row.highest);
+    EXPECT_EQ(std::make_pair(pair[0], pair[1]), std::make_pair(row.current, row.highest));
+    std::string asked;
+    for (const std::string& command : sys.commands) {
+      const size_t column = command.find("print $");
+      if (column != std::string::npos)
+        asked += (asked.empty() ? "" : " ") + std::to_string(std::stoi(command.substr(column + 7)));
+    }
+    EXPECT_EQ(asked, row.asked);
   }
 }
 
@@ -252,7 +332,9 @@ TEST(GetHdTemperature, NoDiskOrNoReading) {
   EXPECT_EQ(temperature, 99);
   sys.links["sda"] = kAtaLink;
   sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}, {Column(10), "38\n"}};
-  EXPECT_FALSE(GetHdTemperature(&temperature));  // column 12 prints nothing
+  bool result = true;
+  EXPECT_EQ(Printed([&] { result = GetHdTemperature(&temperature); }), "");  // a poll prints nothing
+  EXPECT_FALSE(result);  // column 12 prints nothing
   EXPECT_EQ(temperature, 0);
   EXPECT_TRUE(log.Contains("ERROR... HDProbeNodePosition function failed\n"));
   EXPECT_EQ(log.texts().back(), "Drive Temperature was no available\n");

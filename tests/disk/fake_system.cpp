@@ -66,7 +66,6 @@ os::SysCalls Calls() {
     return Answer(device, request, static_cast<unsigned char*>(argument)) ? 0 : -1;
   };
   calls.readlink = [](const char* path, char* buffer, size_t size) -> ssize_t {
-    g_sys->linksRead.push_back(path);
     auto it = g_sys->links.find(std::string(path).substr(std::strlen("/sys/class/block/")));
     if (it == g_sys->links.end()) return -1;
     const size_t n = std::min(size, it->second.size());
@@ -92,6 +91,7 @@ os::SysCalls Calls() {
   };
   calls.sleep = [](unsigned int seconds) -> unsigned int {
     g_sys->sleeps.push_back(seconds);
+    if (g_sys->onSleep) g_sys->onSleep();
     if (--g_sys->sleepsLeft <= 0) throw StopLoop();
     return 0;
   };

@@ -7,6 +7,7 @@
 #define STBPLAT_TESTS_DISK_FAKE_SYSTEM_H
 
 #include <array>
+#include <functional>
 #include <map>
 #include <memory>
 #include <set>
@@ -42,9 +43,9 @@ struct FakeSystem {
   bool pipeOpenFails = false;
   bool pipeCloseFails = false;
   int sleepsLeft = 1;  // sleep throws StopLoop when this reaches 0
+  std::function<void()> onSleep;  // what changes while the caller sleeps
 
   std::vector<std::string> opened;  // open and fopen64 paths
-  std::vector<std::string> linksRead;
   std::vector<std::string> commands;
   std::vector<unsigned int> sleeps;
   std::array<unsigned char, 4> lastDriveCommand{};

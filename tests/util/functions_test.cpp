@@ -33,7 +33,9 @@ TEST(DumpBuffer, IndentClampedNoBytesAndTheLevelGate) {
   capture.Clear();
   capture.SetLevel(eLogModuleRecords, 3);
   DumpBuffer(eLogModuleRecords, 0, &byte, 1);
+  subSystemLogLevel[eLogModuleCount] = 99;  // the spare entry behind the table
   DumpBuffer(eLogModuleCount, 0, &byte, 1);  // no level to gate it with
+  subSystemLogLevel[eLogModuleCount] = 0;
   EXPECT_TRUE(capture.messages().empty());
 }
 

@@ -40,10 +40,13 @@ TEST(IniParse, LinesSectionsCommentsAndErrors) {
   };
   const Row rows[] = {
       // An inline comment needs whitespace before it; ':' separates where no '=' comes first.
-      {"  name =  a value ; note\r\nother = a;b\n; one\n# two\n\n\t[ my section ]\r\nkey: v\n"
-       "a:b = c\nempty =\n[" + std::string(60, 'S') + "]\ny = 2\n",
+      // A byte-order mark before the first line is skipped; names are passed whole.
+      {"\xEF\xBB\xBF  name =  a value ; note\r\nother = a;b\n; one\n# two\n\n\t[ my section ]\r\n"
+       "key: v\na:b = c\nempty =\n[" + std::string(60, 'S') + "]\n" + std::string(60, 'n') +
+       " = ;v\n",
        0, "", "[] name=a value\n[] other=a;b\n[ my section ] key=v\n[ my section ] a:b=c\n"
-       "[ my section ] empty=\n[" + std::string(49, 'S') + "] y=2\n"},
+       "[ my section ] empty=\n[" + std::string(49, 'S') + "] " + std::string(60, 'n') + "=;v\n"},
+      {"\xEF\xBB\xBF[net]\nip = 1\n\xEF\xBB\xBFk = 2\n", 0, "", "[net] ip=1\n[net] \xEF\xBB\xBFk=2\n"},
       // A commented ']' leaves the section as it was.
       {"[a]\n[sec ; note]\nk = v\n", 2,
        "ERROR: No closing ']' found on line 2 in file test.ini: [sec ; note]\r\n", "[a] k=v\n"},
@@ -90,9 +93,14 @@ TEST(INIReader, OwnCopyOfTheNameDirectiveHandlerAndMissingFiles) {
   EXPECT_EQ(reader.Parse(), -1);
   INIReader unnamed(nullptr, IniRecorder::OnValue, &recorder);
   EXPECT_EQ(unnamed.Parse(), -1);
+  INIReader directory(dir.path().c_str(), IniRecorder::OnValue, &recorder);
+  EXPECT_EQ(directory.Parse(), -1);  // it opens, but no line can be read
   EXPECT_EQ(testing::internal::GetCapturedStdout(),
             "Unable to open ini file " + path + "\r\nFile name not specified to INIReader\r\n"
-            "Unable to open ini file (null)\r\n");
+            "Unable to open ini file (null)\r\nUnable to read ini file " + dir.path() + "\r\n");
+  char copy[] = "abc";
+  EXPECT_EQ(reader.strncpy0(copy + 1, "xyz", 0), copy + 1);
+  EXPECT_STREQ(copy, "abc");  // no room, nothing written
 }
 
 }  // namespace
