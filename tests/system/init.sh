@@ -16,7 +16,7 @@ mkdir -p /dev/pts /dev/shm
 # /dev is our own: links to the kernel's nodes, except the MTD nodes, which
 # follow the device's numbering (see make_table).
 for n in null zero full random urandom console tty kmsg mem ttyS0 ttyS1 \
-         ttyAMA0 hvc0 sda sdb sg0 sg1 vda; do
+         ttyAMA0 hvc0 sda sdb sdc sdd sde sg0 sg1 sg2 sg3 sg4 vda; do
   ln -s /realdev/$n /dev/$n
 done
 # The eMMC of the box is /dev/mmca; here it is the virtio disk.
@@ -145,9 +145,16 @@ nand_load() {
 
 # ---- Start-up -------------------------------------------------------------------
 echo "systest: kernel $KVER"
-for m in virtio_pci virtio_console ahci sd_mod sg virtio_blk mtd; do load $m; done
-for _ in 1 2 3 4 5; do [ -e /realdev/$RESULTS_PORT ] && break; sleep 1; done
+# The USB stick is found before the AHCI driver loads, so it is sda (sg0) and
+# the disk sdb (sg1): a stick plugged in at boot can take a lower letter
+# than the disk on the box too. The card-reader slot's controller (ehci_pci)
+# is loaded by the scenarios that want it.
+for m in virtio_pci virtio_console xhci_pci usb_storage sd_mod sg virtio_blk mtd; do load $m; done
+wait_for() { for _ in $(seq 1 50); do [ -e "$1" ] && return 0; sleep 0.2; done; return 1; }
+wait_for /realdev/$RESULTS_PORT
 stty -F /realdev/$RESULTS_PORT raw -echo 2>/dev/null
+wait_for /realdev/sda || fail setup "no USB stick"
+load ahci
 setup_nor || fail setup "NOR simulator"
 : >/tmp/fake_mtd
 mount --bind /tmp/fake_mtd /proc/mtd
@@ -155,10 +162,7 @@ mount --bind /tmp/fake_mtd /proc/mtd
 # ROOTFS.A block 8, DATA.A block 4.
 BAD_AT_LOAD=2,20,40,100
 # Disk nodes appear asynchronously once the controllers probed.
-for _ in 1 2 3 4 5 6 7 8 9 10; do
-  [ -e /realdev/sda ] && [ -e /realdev/vda ] && break
-  sleep 1
-done
+wait_for /realdev/sdb && wait_for /realdev/vda || fail setup "no disk"
 nand_load badblocks=$BAD_AT_LOAD || fail setup "NAND simulator"
 cat /proc/mtd
 

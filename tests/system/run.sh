@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
 # System tests: boots a Debian kernel under qemu with a busybox initramfs
 # holding the guest test programs, simulated NAND (nandsim) and NOR (mtdram)
-# flash, an AHCI hard disk and a virtio disk standing in for the eMMC, then
+# flash, an AHCI hard disk, USB storage and a virtio disk standing in for the
+# eMMC, then
 # turns the guest's result lines into this script's result.
 #
 # Usage: tests/system/run.sh            (from anywhere)
@@ -85,7 +86,7 @@ cp "$here/smart_drivedb.h" "$rootfs/etc/smart_drivedb.h"
 
 # Kernel modules with their dependencies, in load order. moddeps lists, per
 # module, the files to insmod (dependencies first).
-modules="mtd mtdram nandsim ahci sd_mod sg virtio_pci virtio_blk virtio_console"
+modules="mtd mtdram nandsim ahci sd_mod sg virtio_pci virtio_blk virtio_console xhci_pci ehci_pci usb_storage"
 : >"$rootfs/etc/moddeps"
 for m in $modules; do
   files=""
@@ -121,9 +122,12 @@ echo "${STBPLAT_SYSTEM_ONLY:-}" >"$rootfs/etc/systest-only"
 
 # --- Disks -------------------------------------------------------------------------
 # xfer.img carries files out of the guest: a tar archive written over the
-# raw disk (see the tool scenarios).
-rm -f "$vm/hdd.img" "$vm/emmc.img" "$vm/xfer.img"
+# raw disk (see the tool scenarios). stick.img is a USB stick (on the xHCI
+# controller); the EHCI controller holds a card-reader slot with no card in
+# it (a removable usb-storage device with no medium).
+rm -f "$vm/hdd.img" "$vm/emmc.img" "$vm/xfer.img" "$vm/stick.img"
 truncate -s 256M "$vm/hdd.img"
+truncate -s 16M "$vm/stick.img"
 truncate -s 64M "$vm/emmc.img"
 truncate -s 16M "$vm/xfer.img"
 
@@ -140,7 +144,13 @@ timeout -k 10 "$bound" "${qemu[@]}" \
   -drive if=none,id=emmc,file="$vm/emmc.img",format=raw \
   -device virtio-blk-pci,drive=emmc \
   -drive if=none,id=xfer,file="$vm/xfer.img",format=raw \
-  -device virtio-blk-pci,drive=xfer
+  -device virtio-blk-pci,drive=xfer \
+  -device qemu-xhci,id=xhci \
+  -drive if=none,id=stick,file="$vm/stick.img",format=raw \
+  -device usb-storage,bus=xhci.0,drive=stick,serial=STICK0001 \
+  -device usb-ehci,id=ehci \
+  -drive if=none,id=slot \
+  -device usb-storage,bus=ehci.0,drive=slot,removable=on,serial=SLOT0001
 qemu_rc=$?
 set -e
 end=$(date +%s)

@@ -66,13 +66,15 @@ if want smoke.devmem; then
 fi
 
 if want smoke.disk_tools; then
+  # sda is the USB stick, sdb the disk (see init.sh).
   s=smoke.disk_tools
-  hdparm -i /dev/sda >/tmp/hd 2>&1
+  hdparm -i /dev/sdb >/tmp/hd 2>&1
   check $s "hdparm model" has 'Model=ST1000DM003-1SB102' /tmp/hd
-  smartctl -d ata -A /dev/sda >/tmp/sm 2>&1
+  smartctl -d ata -A /dev/sdb >/tmp/sm 2>&1
   check $s "smartctl temperature line" has 'Temperature_Celsius' /tmp/sm
-  info "smartctl -d ata -A /dev/sda: $(grep -i temperature /tmp/sm | tr -s ' ')"
-  check $s "sda on ATA" sh -c 'readlink /sys/class/block/sda | grep -q /ata'
+  info "smartctl -d ata -A /dev/sdb: $(grep -i temperature /tmp/sm | tr -s ' ')"
+  check $s "sdb on ATA" sh -c 'readlink /sys/class/block/sdb | grep -q /ata'
+  check $s "sda on USB" sh -c 'readlink /sys/class/block/sda | grep -q /usb'
   scenario_end $s
 fi
 
@@ -95,6 +97,13 @@ for s in disk.is_dev_hdd disk.blk_dev_size disk.vendor_info disk.vendor_type \
          disk.node_position disk.temperature disk.smart_loop; do
   run_guest $s
 done
+# The stick is pulled (deleted through sysfs) in the first; then a card
+# reader with an empty slot comes in on the lowest free letter (sda after
+# the stick), and the second takes the disk away for a while.
+run_guest disk.usb_stick
+if want disk.usb_empty_slot; then
+  load ehci_pci && run_guest disk.usb_empty_slot || fail disk.usb_empty_slot "ehci_pci"
+fi
 
 # ---- Flash faults ----------------------------------------------------------------------
 # DATA.A (mtd12) spans NAND blocks 96-127, pages of 2 KiB, 64 a block.
