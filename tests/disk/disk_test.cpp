@@ -1,27 +1,46 @@
-// The disk probes over the simulated machine: identity, size, disk
+// The disk probes over emulated disks whose hdparm and smartctl output is
+// captured text run through the real grep and awk: identity, size, disk
 // detection and the SMART loop, which print; then the probes that log: where
-// the disk sits, the SCSI generic bus, the vendor asked of hdparm and the
-// temperature read from smartctl's pipe.
+// the disk sits, the SCSI generic bus, the vendor and the temperature.
 #include <gtest/gtest.h>
 
 #include <cstring>
 #include <string>
 
-#include "disk/fake_system.h"
+#include "devmodel/disk_sim.h"
 #include "stbplat/disk.h"
 #include "support/log_capture.h"
 
 namespace {
 
-using stbplat::test::FakeSystem;
-using stbplat::test::kAtaLink;
-using stbplat::test::kUsbLink;
 using stbplat::test::LogCapture;
-using stbplat::test::Texts;
+using Texts = std::vector<std::string>;
 
 const std::string kError = "\n\r[ErrorMsg] [";
+const char* const kAtaLink =
+    "../../devices/pci0000:00/0000:00:1f.2/ata1/host0/target0:0:0/0:0:0:0/block/sda";
+const char* const kUsbLink =
+    "../../devices/pci0000:00/0000:00:14.0/usb2/2-1/2-1:1.0/host6/target6:0:0/6:0:0:0/block/sdb";
+const char* const kSmartctl = "smartctl -d ata -A /dev/sda";
 
-std::string Column(int column) { return "{print $" + std::to_string(column) + "}"; }
+struct StopLoop {};
+
+// The emulated machine; nothing the library opened may stay open.
+struct Machine : stbplat::devmodel::DiskSim {
+  ~Machine() { EXPECT_EQ(OpenCount(), 0u) << "descriptors, streams or pipes left open"; }
+};
+
+// smartctl's temperature line with these columns 4 (value), 5 (worst), 10
+// (raw) and 11-12 ("(Min/Max a/b)").
+std::string SmartLine(const std::string& value, const std::string& worst, const std::string& raw,
+                      const std::string& minMax = "") {
+  return "194 Temperature_Celsius 0x0022 " + value + " " + worst + " 000 Old_age Always - " + raw +
+         (minMax.empty() ? "" : " (Min/Max " + minMax + ")") + "\n";
+}
+
+std::string HdparmModel(const std::string& model) {
+  return "\n/dev/sda:\n\n Model=" + model + ", FwRev=CC26, SerialNo=Z1E6ABCD\n Config={ Fixed }\n";
+}
 
 template <typename Call>
 std::string Printed(Call call) {
@@ -31,19 +50,18 @@ std::string Printed(Call call) {
 }
 
 TEST(GetVendorInfo, FieldsAtTheirOffsetsCutToTheirWidths) {
-  FakeSystem sys;
+  Machine sys;
   std::string identity(512, '#');
   identity.replace(20, 8, "Z1E6ABCD").replace(54, 18, "ST2000DM001-1CH164");
   sys.devices["/dev/sda"].identity = identity;
   sys.devices["/dev/sdb"];  // answers no identity request
-  sys.devices["/dev/"];     // what an empty name would open
   char sda[] = "sda", sdb[] = "sdb", sdx[] = "sdx", empty[] = "";
   std::vector<int> results;
   const std::string printed = Printed([&] {
     for (char* name : {sda, sdb, sdx, empty, static_cast<char*>(nullptr)})
       results.push_back(GetVendorInfo(name));
   });
-  EXPECT_EQ(results, (std::vector<int>{0, 0, -1, -1, -1}));
+  EXPECT_EQ(results, (std::vector<int>{0, 0, -1, -1, -1}));  // no name would open /dev/
   const std::string cannotOpen = "ERROR: Cannot open device \n";
   // The failure message reads "successful", as it always has.
   EXPECT_EQ(printed, "Hard Disk Model: ST2000DM001-1CH164" + std::string(22, '#') +
@@ -69,7 +87,7 @@ TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
   };
   for (const Row& row : rows) {
     SCOPED_TRACE(row.link.substr(0, 60));
-    FakeSystem sys;
+    Machine sys;
     sys.links["sdb"] = row.link;
     sys.devices["/dev/sdb"].size = row.size;
     int result = -1;
@@ -80,7 +98,7 @@ TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
 }
 
 TEST(GetHDDTemperature, PrintsTheTemperatureEntryEveryTenSeconds) {
-  FakeSystem sys;
+  Machine sys;
   testing::internal::CaptureStdout();
   EXPECT_EQ(GetHDDTemperature(), -1);
   sys.links["sdb"] = kAtaLink;
@@ -93,8 +111,10 @@ TEST(GetHDDTemperature, PrintsTheTemperatureEntryEveryTenSeconds) {
   sda.attributes[29] = {194, 0x22, 0, 37, 54, 42, 0, 19, 0, 56, 0, 0};
   sda.attributes.push_back({194, 0x22, 0, 1, 2, 3, 4, 5, 6, 7, 8, 0});
   sda.smartReads = 1;  // the second round's request fails and shows the cleared data
-  sys.sleepsLeft = 2;
-  EXPECT_THROW(GetHDDTemperature(), stbplat::test::StopLoop);
+  sys.onSleep = [&](unsigned int) {
+    if (sys.sleeps.size() == 2) throw StopLoop();
+  };
+  EXPECT_THROW(GetHDDTemperature(), StopLoop);
   EXPECT_EQ(testing::internal::GetCapturedStdout(),
             "ATA HDD not found \nIsDevHDD(): ATA HDD found \nDevice open failed \n"
             "IsDevHDD(): ATA HDD found \nCurrent Val= 36 \n Worst Val= 53 \n "
@@ -106,15 +126,15 @@ TEST(GetHDDTemperature, PrintsTheTemperatureEntryEveryTenSeconds) {
 
 // Nodes sda .. sde as one letter each: '-' absent, 'a' an ATA disk, 's' a
 // small USB stick, 'U' a large USB disk whose identity checksum is right, 'r'
-// an empty card-reader slot (USB, does not open, no identity).
-void Attach(FakeSystem& sys, const std::string& nodes) {
+// an empty card-reader slot (USB, does not open, an identity of zeros).
+void Attach(Machine& sys, const std::string& nodes) {
   for (size_t i = 0; i < nodes.size(); ++i) {
     const std::string name = std::string("sd") + static_cast<char>('a' + i), path = "/dev/" + name;
     if (nodes[i] == '-') continue;
     sys.links[name] = nodes[i] == 'a' ? kAtaLink : kUsbLink;
-    if (nodes[i] == 's' || nodes[i] == 'U')
-      sys.devices[path].size = 1LL << (nodes[i] == 's' ? 33 : 40);
-    sys.pipes.push_back({"hdparm -I " + path + " ", nodes[i] == 'U' ? "1\n" : "0\n"});
+    if (nodes[i] == 's' || nodes[i] == 'U') sys.devices[path].size = 1LL << (nodes[i] == 's' ? 33 : 40);
+    sys.tools["hdparm -I " + path] = "\n" + path + ":\n\nATA device, with non-removable media\n" +
+                                     (nodes[i] == 'U' ? "Checksum: correct\n" : "");
   }
 }
 
@@ -144,16 +164,15 @@ TEST(HardDriveProbeNodePosition, FindsTheDiskWhateverSitsBeforeItQuietly) {
   };
   for (const Row& row : rows) {
     SCOPED_TRACE(row.what);
-    FakeSystem sys;
+    Machine sys;
     auto list = [&](size_t devices) {
       std::string& text = sys.files["/proc/scsi/scsi"] = "Attached devices:\n";
-      for (size_t i = 0; i < devices; ++i) text += "Host: scsi0 Channel: 00\n";
+      for (size_t i = 0; i < devices; ++i) text += "Host: scsi0 Channel: 00 Id: 00 Lun: 00\n";
     };
     if (row.listed != 0) list(row.listed);
     Attach(sys, row.nodes);
-    sys.pipes.push_back({"lsmod", row.lsmod});
-    sys.sleepsLeft = 10;
-    sys.onSleep = [&] {
+    sys.tools["lsmod"] = row.lsmod;
+    sys.onSleep = [&](unsigned int) {
       if (!row.lateNodes.empty()) list(row.lateNodes.size());
       Attach(sys, row.lateNodes);
     };
@@ -168,7 +187,7 @@ TEST(HardDriveProbeNodePosition, FindsTheDiskWhateverSitsBeforeItQuietly) {
 }
 
 TEST(HardDriveProbeNodePosition, ListReadInPiecesHostNumbersAndMessages) {
-  FakeSystem sys;
+  Machine sys;
   HardDriveNodeInfo drive;
   std::memset(&drive, 0xEE, sizeof drive);
   LogCapture log;
@@ -197,7 +216,7 @@ TEST(HardDriveProbeNodePosition, ListReadInPiecesHostNumbersAndMessages) {
 }
 
 TEST(HardDriveProbeScsiBusPosition, BusAmongTheGenericDevices) {
-  FakeSystem sys;
+  Machine sys;
   sys.devices["/dev/sg1"].bus = 0;
   sys.devices["/dev/sg2"].bus = 3;
   LogCapture log;
@@ -214,49 +233,53 @@ TEST(HardDriveProbeScsiBusPosition, BusAmongTheGenericDevices) {
   EXPECT_EQ(sys.opened.size(), 9u);  // sg0 .. sg2, then all five, then sg0
 }
 
-// The pipe-reading probes: each row sets up hdparm's and smartctl's output,
-// makes one call, and checks its result and messages.
+// The pipe-reading probes: each row gives hdparm's or smartctl's output and
+// the pipe's faults, makes one call, and checks its result and messages.
 TEST(PipeProbes, VendorAndReadingsOrTheFailureOfEachStep) {
   const std::string type = kError + "HardDriveGetVendorType] ";
   const std::string data = kError + "HardDriveGetTemperatureData] ";
+  const std::string toshiba = HdparmModel("TOSHIBA DT01ACA100"), seagate = HdparmModel("ST2000DM001");
+  enum Fault { kNone, kSilent, kOpen, kClose, kSilentClose };
   struct Row {
     unsigned char node, column;  // column 0: ask for the vendor
-    std::vector<std::pair<std::string, std::string>> pipes;
-    bool openFails, closeFails;
+    std::string output;
+    Fault fault;
     int result, value;  // the vendor or the reading
     Texts log;
   };
   const Row rows[] = {
-      {4, 0, {{"-c Model=To", "1\n"}, {"grep", "0\n"}}, false, false, 1, 3, {}},
-      {5, 0, {}, false, false, 0, 4, {type + "Failed To Input Wrong Device Node Number (5)\n\r"}},
-      {0, 0, {}, false, false, 0, 4, {type + "Scan Model Failed\n\r"}},  // hdparm prints nothing
-      {0, 0, {}, false, true, 0, 4,
+      {4, 0, toshiba, kNone, 1, 3, {}},
+      {5, 0, toshiba, kNone, 0, 4, {type + "Failed To Input Wrong Device Node Number (5)\n\r"}},
+      {0, 0, seagate, kSilent, 0, 4, {type + "Scan Model Failed\n\r"}},
+      {0, 0, seagate, kSilentClose, 0, 4,
        {type + "Scan Model Failed\n\r", type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r"}},
       // A match is lost with its pipe.
-      {0, 0, {{"Model=ST", "1\n"}}, false, true, 0, 4,
-       {type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r"}},
-      {0, 0, {}, true, false, 0, 4, {type + "Failed To Open The Pipe-Hdparm Node[/dev/sda]\n\r"}},
-      {4, 5, {{Column(5), "300\n"}}, false, false, 1, 300 & 0xFF, {}},  // kept in 8 bits
-      {0, 4, {{Column(4), "1234\n"}}, false, false, 1, 123, {}},        // three digits at most
-      {0, 12, {{Column(12), "21/47)\n"}}, false, false, 1, 47, {}},
+      {0, 0, seagate, kClose, 0, 4, {type + "Failed To Close The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      {0, 0, seagate, kOpen, 0, 4, {type + "Failed To Open The Pipe-Hdparm Node[/dev/sda]\n\r"}},
+      {4, 5, SmartLine("100", "300", "36"), kNone, 1, 300 & 0xFF, {}},  // kept in 8 bits
+      {0, 4, SmartLine("1234", "98", "36"), kNone, 1, 123, {}},        // three digits at most
+      {0, 12, SmartLine("100", "98", "36", "21/47"), kNone, 1, 47, {}},
       // Refused before any command runs.
-      {5, 10, {}, false, false, 0, 0, {data + "Failed To Input Wrong Device Node Number (5)\n\r"}},
-      {0, 13, {}, false, false, 0, 0, {data + "Failed To Input Wrong Offset (13)\n\r"}},
-      {0, 12, {{Column(12), "21\n"}}, false, false, 0, 0, {data + "Scan Data Failed\n\r"}},
-      {0, 10, {}, false, true, 0, 0,
+      {5, 10, "", kNone, 0, 0, {data + "Failed To Input Wrong Device Node Number (5)\n\r"}},
+      {0, 13, "", kNone, 0, 0, {data + "Failed To Input Wrong Offset (13)\n\r"}},
+      {0, 12, SmartLine("100", "98", "21"), kNone, 0, 0, {data + "Scan Data Failed\n\r"}},
+      {0, 10, SmartLine("100", "98", "36"), kSilentClose, 0, 0,
        {data + "Scan Data Failed\n\r", data + "Failed To Close The Pipe-Smartctl Node[/dev/sda]\n\r"}},
       // Stored before the close failed.
-      {4, 5, {{Column(5), "44\n"}}, false, true, 0, 44,
+      {4, 10, SmartLine("100", "98", "44"), kClose, 0, 44,
        {data + "Failed To Close The Pipe-Smartctl Node[/dev/sde]\n\r"}},
-      {0, 5, {}, true, false, 0, 0, {data + "Failed To Open The Pipe-Smartctl Node[/dev/sda]\n\r"}},
+      {0, 5, SmartLine("100", "98", "36"), kOpen, 0, 0,
+       {data + "Failed To Open The Pipe-Smartctl Node[/dev/sda]\n\r"}},
   };
   Texts lastCommands;
   for (const Row& row : rows) {
     SCOPED_TRACE(std::to_string(row.node) + " " + std::to_string(row.column));
-    FakeSystem sys;
-    sys.pipes = row.pipes;
-    sys.pipeOpenFails = row.openFails;
-    sys.pipeCloseFails = row.closeFails;
+    Machine sys;
+    const std::string device = row.node == 4 ? "/dev/sde" : "/dev/sda";
+    sys.tools[(row.column == 0 ? "hdparm -i " : "smartctl -d ata -A ") + device] = row.output;
+    sys.pipeSilent = row.fault == kSilent || row.fault == kSilentClose;
+    sys.pipeOpenFails = row.fault == kOpen;
+    sys.pipeCloseFails = row.fault == kClose || row.fault == kSilentClose;
     HardDriveNodeInfo drive{0, 0, row.node, {}};
     unsigned int vendor = 99;
     unsigned char value = 0;
@@ -284,31 +307,30 @@ TEST(PipeProbes, VendorAndReadingsOrTheFailureOfEachStep) {
 TEST(HardDriveGetTemperature, EachVendorsColumnsInOrderAndPair) {
   struct Row {
     const char* model;
-    Texts columns;      // what awk prints for columns 4, 5, 10 and 12
+    Texts columns;      // columns 4, 5, 10 and 12; "x" reads as no number
     std::string asked;  // the columns asked for, in order
     bool result;
     unsigned int current, highest;
   };
   const Row rows[] = {
-      {"ST", {"", "53", "36", ""}, "5 10", true, 36, 53},
-      {"WD", {"100", "98", "40", ""}, "4 5 10", true, 40, 42},
-      {"WD", {"90", "100", "5", ""}, "4 5 10", true, 5, 5u - 10u},  // worked out wide, 32 bits
-      {"Hi", {"", "", "35", "21/47)"}, "12 10", true, 35, 47},
-      {"To", {"", "", "38", "15/52)"}, "12 10", true, 38, 52},
+      {"ST2000DM001", {"100", "53", "36", ""}, "5 10", true, 36, 53},
+      {"WDC WD5000", {"100", "98", "40", ""}, "4 5 10", true, 40, 42},
+      {"WDC WD5000", {"90", "100", "5", ""}, "4 5 10", true, 5, 5u - 10u},  // worked out wide
+      {"Hitachi HDS72", {"100", "98", "35", "21/47"}, "12 10", true, 35, 47},
+      {"TOSHIBA DT01", {"100", "98", "38", "15/52"}, "12 10", true, 38, 52},
       // The first failed reading ends it with a zero pair.
-      {"WD", {"", "98", "40", ""}, "4", false, 0, 0},
-      {"WD", {"100", "", "40", ""}, "4 5", false, 0, 0},
-      {"WD", {"100", "98", "", ""}, "4 5 10", false, 0, 0},
-      {"ST", {"", "53", "", ""}, "5 10", false, 0, 0},
-      {"Hi", {"", "", "35", ""}, "12", false, 0, 0},
-      {"XX", {"", "53", "36", ""}, "", false, 7, 7},  // no vendor: the pair is left alone
+      {"WDC WD5000", {"x", "98", "40", ""}, "4", false, 0, 0},
+      {"WDC WD5000", {"100", "x", "40", ""}, "4 5", false, 0, 0},
+      {"WDC WD5000", {"100", "98", "x", ""}, "4 5 10", false, 0, 0},
+      {"ST2000DM001", {"100", "53", "x", ""}, "5 10", false, 0, 0},
+      {"Hitachi HDS72", {"100", "98", "35", ""}, "12", false, 0, 0},
+      {"Maxtor 6Y080", {"100", "53", "36", ""}, "", false, 7, 7},  // no vendor: the pair stays
   };
   for (const Row& row : rows) {
     SCOPED_TRACE(std::string(row.model) + " " + row.asked);
-    FakeSystem sys;
-    sys.pipes = {{std::string("-c Model=") + row.model, "1\n"}, {"grep -i -c", "0\n"},
-                 {Column(4), row.columns[0]}, {Column(5), row.columns[1]},
-                 {Column(10), row.columns[2]}, {Column(12), row.columns[3]}};
+    Machine sys;
+    sys.tools["hdparm -i /dev/sda"] = HdparmModel(row.model);
+    sys.tools[kSmartctl] = SmartLine(row.columns[0], row.columns[1], row.columns[2], row.columns[3]);
     HardDriveNodeInfo drive{};
     unsigned int pair[2] = {7, 7};
     EXPECT_EQ(HardDriveGetTemperature(&drive, pair), row.result);
@@ -324,21 +346,22 @@ TEST(HardDriveGetTemperature, EachVendorsColumnsInOrderAndPair) {
 }
 
 TEST(GetHdTemperature, NoDiskNoReadingOrTheReading) {
-  FakeSystem sys;
+  Machine sys;
   int temperature = 99;
   LogCapture log;
   EXPECT_FALSE(GetHdTemperature(nullptr));
   EXPECT_FALSE(GetHdTemperature(&temperature));
   EXPECT_EQ(temperature, 99);
   sys.links["sda"] = kAtaLink;
-  sys.pipes = {{"-c Model=To", "1\n"}, {"grep", "0\n"}};
+  sys.tools["hdparm -i /dev/sda"] = HdparmModel("TOSHIBA DT01");
+  sys.tools[kSmartctl] = SmartLine("100", "98", "38");
   bool result = true;
   EXPECT_EQ(Printed([&] { result = GetHdTemperature(&temperature); }), "");  // a poll prints nothing
-  EXPECT_FALSE(result);  // column 12 prints nothing
+  EXPECT_FALSE(result);  // no "(Min/Max a/b)"
   EXPECT_EQ(temperature, 0);
   EXPECT_TRUE(log.Contains("ERROR... HDProbeNodePosition function failed\n"));
   EXPECT_EQ(log.texts().back(), "Drive Temperature was no available\n");
-  sys.pipes.insert(sys.pipes.begin(), {{Column(12), "21/47)\n"}, {Column(10), "38\n"}});
+  sys.tools[kSmartctl] = SmartLine("100", "98", "38", "21/47");
   EXPECT_TRUE(GetHdTemperature(&temperature));
   EXPECT_EQ(temperature, 38);
   EXPECT_EQ(log.texts().back(), "Current Temp = 38  :  High Temp = 47\n");

@@ -78,6 +78,9 @@ const Row kRows[] = {
     {{"flash", "read", "not-a-target"}, 2, kErr, "'not-a-target'"},
     // The example device in host mode.
     {{"--root", "@/device", "map"}, 0, kOut, "bad blocks: 2 (at 0x40000) 5 (at 0xA0000)"},
+    // Its disk: identity and size from the ioctls, the temperature from smartctl through awk.
+    {{"--root", "@/device", "disk", "info"}, 0, kOut, "serial     Z9A1EXMP\nsize       931.5 GiB"},
+    {{"--root", "@/device", "disk", "temp"}, 0, kExactOut, "36 C\n"},
     // ROOTFS.A starts on a bad block: the record comes from the next one.
     {{"--root", "@/device", "record", "show", "NAND0.ROOTFS.A"}, 0, kOut, "root file system 2026.11b"},
     {{"--root", "@/device", "record", "show", "EMMC0.APPS.B"}, 0, kOut, "applications 1.3c"},

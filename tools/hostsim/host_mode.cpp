@@ -9,6 +9,7 @@
 #include <memory>
 
 #include "device_root.h"
+#include "disk_root.h"
 #include "devmodel/flash_sim.h"
 #include "stbplat/memory_map.h"
 
@@ -16,10 +17,16 @@ namespace stbplat {
 namespace hostsim {
 namespace {
 
-// The emulation of the attached device, if any.
-std::unique_ptr<devmodel::FlashSim>& Attached() {
-  static std::unique_ptr<devmodel::FlashSim> sim;
-  return sim;
+// The emulation of the attached device, if any: its flash, and its disks
+// bound over the flash.
+struct Emulation {
+  std::unique_ptr<devmodel::FlashSim> flash;
+  std::unique_ptr<devmodel::DiskSim> disks;
+};
+
+Emulation& Attached() {
+  static Emulation emulation;
+  return emulation;
 }
 
 }  // namespace
@@ -37,16 +44,20 @@ bool Attach(const std::string& root, std::string* error) {
   } else if (!ExtendedMemoryMapStructure::Load(map.c_str(), error)) {
     return false;
   }
-  Attached() = std::move(sim);
+  auto disks = std::make_unique<devmodel::DiskSim>();
+  if (!LoadDisks(root, *disks, error)) return false;
+  Attached().flash = std::move(sim);
+  Attached().disks = std::move(disks);
   return true;
 }
 
 void Detach() {
-  if (Attached()) ExtendedMemoryMapStructure::Reset();
-  Attached().reset();
+  if (IsAttached()) ExtendedMemoryMapStructure::Reset();
+  Attached().disks.reset();
+  Attached().flash.reset();
 }
 
-bool IsAttached() { return Attached() != nullptr; }
+bool IsAttached() { return Attached().flash != nullptr; }
 
 }  // namespace hostsim
 }  // namespace stbplat

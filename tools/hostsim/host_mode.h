@@ -8,6 +8,7 @@
 //   dev/mtdN.ini            its geometry: type (nor, nand, emmc), erase and
 //                           page size, OOB size, bad blocks
 //   dev/mmca                the whole eMMC device
+//   dev/sdX.ini ...         hard disks and their tools' output (disk_root.h)
 // While attached, the library's device and file calls for /proc/mtd and
 // /dev/... are answered from these files, every other path is passed on, and
 // the platform's memory map is the one in the root.

@@ -18,6 +18,7 @@
 #include <string>
 #include <vector>
 
+#include "example_disk.h"
 #include "example_layout.h"
 #include "example_records.h"
 
@@ -54,7 +55,9 @@ int main(int argc, char** argv) {
     return 2;
   }
   std::string root = argv[1];
-  if (!MakeDir(root) || !MakeDir(root + "/proc") || !MakeDir(root + "/dev")) return 1;
+  if (!MakeDir(root) || !MakeDir(root + "/proc") || !MakeDir(root + "/proc/scsi") ||
+      !MakeDir(root + "/dev"))
+    return 1;
 
   Layout layout;
   std::string error;
@@ -68,5 +71,6 @@ int main(int argc, char** argv) {
   ok = ok && WriteFile(root + "/dev/" + layout.norImageName, layout.nor.data(), layout.nor.size()) &&
        WriteFile(root + "/dev/" + layout.nandImageName, layout.nand.data(), layout.nand.size()) &&
        WriteFile(root + "/dev/mmca", layout.emmc.data(), layout.emmc.size());
+  for (const auto& file : stbplat::example::DiskFiles()) ok = ok && WriteText(root + "/" + file.first, file.second);
   return ok ? 0 : 1;
 }
