@@ -95,6 +95,8 @@ TEST(IsDevHDD, AtaLinksAndUsbDevicesAbove256GiB) {
     EXPECT_EQ(result, row.result);
     EXPECT_EQ(sys.opened.size(), row.link == kUsbLink ? 1u : 0u);  // only USB sizes are asked
   }
+  Machine sys;
+  EXPECT_EQ(Printed([] { EXPECT_EQ(GetBlkDevSize("sdq"), ~0ul); }), "Device /dev/sdq open failed \n");
 }
 
 TEST(GetHDDTemperature, PrintsTheTemperatureEntryEveryTenSeconds) {
@@ -231,6 +233,8 @@ TEST(HardDriveProbeScsiBusPosition, BusAmongTheGenericDevices) {
   EXPECT_EQ(log.texts(), (Texts{probe + "Scsi Device7 Bus3 Not Found\n\r",
                                 probe + "Failed On SCSI_IOCTL_GET_BUS_NUMBER\n\r"}));
   EXPECT_EQ(sys.opened.size(), 9u);  // sg0 .. sg2, then all five, then sg0
+  EXPECT_EQ(HardDriveProbeScsiBusPosition(3, nullptr) + HardDriveProbeNodePosition(nullptr) +
+                HardDriveScanDeviceNode(nullptr) + HardDriveProbeSataPosition(nullptr), 0);
 }
 
 // The pipe-reading probes: each row gives hdparm's or smartctl's output and

@@ -53,7 +53,7 @@ TEST(StringChecks, BoundedSearchAllowedSetAndAddresses) {
   EXPECT_FALSE(IsValidIpAddress("192.168.1.256"));
   for (const char* net : {"255.255.255.0", "1.2.3.", "999.1.2.3", "..."})
     EXPECT_TRUE(IsValidSubNet(net)) << net;
-  for (const char* net : {"1.2.3", "a.b.c.d", "1.2.3.4.5", "1.2.3.-4", ""})
+  for (const char* net : {"1.2.3", "a.b.c.d", "1.2.3.4.5", "1.2.3.-4", "", static_cast<const char*>(nullptr)})
     EXPECT_FALSE(IsValidSubNet(net)) << net;
 }
 
