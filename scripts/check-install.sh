@@ -14,6 +14,14 @@ consumer=$src/tests/install/consumer
 unset LD_LIBRARY_PATH
 "$prefix/bin/stbplat" --help >/dev/null
 "$prefix/bin/stbplat" --root "$src/examples/device" record show NOR0.BOOT.A >/dev/null
+# The manual and the completion come with it, and name every command group.
+groups=$("$prefix/bin/stbplat" --help | sed -n '/^Subcommands:/,$p' | awk 'NR > 1 {print $1}')
+for group in $groups; do
+  grep '^\.B' "$prefix/share/man/man1/stbplat.1" | sed 's/\\f[BRI]//g' | grep -qw -- "$group" || { echo "check-install: the manual lacks $group" >&2; exit 1; }
+done
+completion=$(bash -c 'source "$1"; COMP_WORDS=(stbplat fla); COMP_CWORD=1; PATH=$2:$PATH _stbplat; echo "${COMPREPLY[*]}"' \
+  _ "$prefix/share/bash-completion/completions/stbplat" "$prefix/bin")
+[ "$completion" = flash ] || { echo "check-install: completion of 'fla' gave '$completion'" >&2; exit 1; }
 
 cmake -S "$consumer" -B "$work/cmake-build" -G Ninja -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
 cmake --build "$work/cmake-build" >/dev/null

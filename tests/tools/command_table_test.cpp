@@ -32,7 +32,7 @@ std::string Stream(bool altered) {
 }
 const std::string kStream = Stream(false);
 
-enum Where { kOut, kErr, kExactOut };
+enum Where { kOut, kErr, kExactOut, kExactErr };
 
 struct Row {
   std::vector<std::string> args;
@@ -71,6 +71,12 @@ const Row kRows[] = {
     // Conventions: help; usage errors exit 2 naming the argument.
     {{"--help"}, 0, kOut, "Usage:"},
     {{"frobnicate"}, 2, kErr, "frobnicate"},
+    {{"recrod", "show"}, 2, kErr, "'recrod'\nDid you mean 'record'?"},
+    {{"flash"}, 2, kErr, "stbplat: flash needs a command: read, write, erase, erase-sector\n"},
+    {{"--version"}, 0, kOut, "stbplat "},
+    // -q keeps the library's messages back, the tool's own error stays.
+    {{"-q", "--root", "@/device", "record", "show", "NOR0.PANL.A"}, 1, kExactErr,
+     "stbplat: cannot open location NOR0.PANL.A\n"},
     {{"hexdump", "--indent", "500", "x"}, 2, kErr, "--indent"},
     {{"disk", "info", "/dev/sda"}, 2, kErr, "/dev/sda"},
     {{"--root", "@", "crc16", "-"}, 2, kErr, "proc/mtd", "x"},
@@ -136,8 +142,8 @@ TEST(Commands, AnswerEachRow) {
     const std::string text = Expand(row.text, dir.path());
     SCOPED_TRACE(testing::PrintToString(args) + "\n" + run.err);
     EXPECT_EQ(row.exitCode, run.exitCode);
-    if (row.where == kExactOut)
-      EXPECT_EQ(text, run.out);
+    if (row.where == kExactOut || row.where == kExactErr)
+      EXPECT_EQ(text, row.where == kExactOut ? run.out : run.err);
     else
       EXPECT_NE(std::string::npos, (row.where == kErr ? run.err : run.out).find(text));
   }

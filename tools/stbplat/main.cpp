@@ -15,6 +15,7 @@
 #include "stbplat/stbplat.h"
 #include "tool.h"
 #include "actions.h"
+#include "usage_hints.h"
 
 namespace stbtool {
 
@@ -42,6 +43,9 @@ int Run(int argc, char** argv) {
       ->type_name("DIR");
   app.add_flag("-v,--verbose", options.verbose,
                "More library messages on standard error (repeat for more)");
+  app.add_flag("-q,--quiet", options.quiet,
+               "No library messages and no progress; the command's own errors still show");
+  app.set_version_flag("--version", "stbplat " STBPLAT_VERSION);
 
   RegisterRecordCommands(app);
   RegisterFlashCommands(app);
@@ -56,21 +60,33 @@ int Run(int argc, char** argv) {
     return app.exit(e);
   } catch (const CLI::CallForAllHelp& e) {
     return app.exit(e);
+  } catch (const CLI::CallForVersion& e) {
+    return app.exit(e);
   } catch (const CLI::ParseError& e) {
-    // A word that is no command leaves the parser asking for one; say which.
+    // A word that is no command leaves the parser asking for one; say which,
+    // and what it may have meant.
     std::vector<std::string> left = app.remaining(true);
-    if (!left.empty() && (dynamic_cast<const CLI::RequiredError*>(&e) != nullptr ||
-                          dynamic_cast<const CLI::ExtrasError*>(&e) != nullptr))
-      std::fprintf(stderr,
-                   "stbplat: unknown command or argument '%s'\n"
-                   "Run with --help for the commands and their arguments.\n",
-                   left.front().c_str());
-    else
+    const CLI::App& innermost = InnermostCommand(app);
+    const bool commandMissing = dynamic_cast<const CLI::RequiredError*>(&e) != nullptr ||
+                                dynamic_cast<const CLI::ExtrasError*>(&e) != nullptr;
+    const std::string where =
+        innermost.get_parent() == nullptr ? "a command is needed" : innermost.get_name() + " needs a command";
+    if (!left.empty() && commandMissing) {
+      std::fprintf(stderr, "stbplat: unknown command or argument '%s'\n", left.front().c_str());
+      const std::string nearest = NearestCommand(innermost, left.front());
+      if (!nearest.empty()) std::fprintf(stderr, "Did you mean '%s'?\n", nearest.c_str());
+      std::fprintf(stderr, "Run with --help for the commands and their arguments.\n");
+    } else if (commandMissing && !innermost.get_subcommands({}).empty()) {
+      std::fprintf(stderr, "stbplat: %s: %s\nRun with --help for more.\n",
+                   where.c_str(), CommandNames(innermost).c_str());
+    } else {
       app.exit(e);
+    }
     return kExitUsage;
   }
 
   if (options.verbose > 0) SetErrorLogLevel(eLogLevelError + static_cast<unsigned>(options.verbose));
+  if (options.quiet) SetErrorLogLevel(0);
 
   if (!options.root.empty()) {
     std::string error;

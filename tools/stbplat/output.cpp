@@ -129,7 +129,7 @@ std::string CaptureStandardOutput(const std::function<void()>& body) {
 Progress::Progress(const std::string& label, unsigned long total)
     : label_(label),
       total_(total),
-      shown_(total >= kProgressThreshold && isatty(STDERR_FILENO)),
+      shown_(total >= kProgressThreshold && isatty(STDERR_FILENO) && !Options().quiet),
       lastPercent_(-1) {}
 
 Progress::~Progress() {

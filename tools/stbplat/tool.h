@@ -34,6 +34,8 @@ struct GlobalOptions {
   std::string root;
   // Library log level for error output; raised with -v.
   int verbose = 0;
+  // -q: no library messages and no progress; the command's own errors stay.
+  bool quiet = false;
 };
 
 GlobalOptions& Options();
