@@ -57,10 +57,34 @@ constexpr Source kSources[] = {Source::kMemory, Source::kFile, Source::kNor};
 // A stream over the input on source; null when the input does not fit it.
 std::unique_ptr<Extruder> OpenSource(Source source, const unsigned char* data, size_t size);
 
+// The NOR slot's bytes with the input at its start, erased behind it; null
+// when the input does not fit the slot.
+const std::vector<unsigned char>* NorSlotBytes(const unsigned char* data, size_t size);
+// Errors the byte streams have logged so far: a memory stream logs one when
+// it runs out.
+unsigned long StreamErrorCount();
+
+// A NOR read past the slot does not fail, so a corrupt count walks on
+// through the flash calls for up to 65 535 entries: seconds per input, spent
+// on the same few failing reads over and over. The record is read from the slot's bytes in memory
+// first; the NOR way is taken when that read stays inside them, where both
+// streams see the same bytes.
+template <typename Record, typename ReadFn>
+bool ReadStaysInNorSlot(const unsigned char* data, size_t size, ReadFn read) {
+  const std::vector<unsigned char>* slot = NorSlotBytes(data, size);
+  if (slot == nullptr) return false;
+  Extruder in(slot->data(), static_cast<unsigned int>(slot->size()));
+  Record record;
+  const unsigned long errors = StreamErrorCount();
+  read(record, in);
+  return StreamErrorCount() == errors;
+}
+
 // Reads a record from the input on every source; what reads must round-trip.
 template <typename Record, typename ReadFn, typename StoreFn>
 void FuzzRecord(const unsigned char* data, size_t size, ReadFn read, StoreFn store) {
   for (Source source : kSources) {
+    if (source == Source::kNor && !ReadStaysInNorSlot<Record>(data, size, read)) continue;
     std::unique_ptr<Extruder> in = OpenSource(source, data, size);
     if (!in) continue;
     Record record;

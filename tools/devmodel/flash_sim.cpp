@@ -28,14 +28,6 @@ const os::SysCalls& Libc() { return os::LibcSysCalls(); }
 
 }  // namespace
 
-struct FlashSim::Handle {
-  // Null for /dev/mem. An open node outlives its unlinking, as a file does.
-  std::shared_ptr<Node> node;
-  uint64_t position = 0;
-  bool devMem = false;
-  bool writable = true;
-};
-
 struct FlashSim::Fault {
   SimCall call;
   int nth;
@@ -487,26 +479,32 @@ int FlashSim::OpenCount() const { return static_cast<int>(handles_.size()) + ope
 
 int FlashSim::Open(const char* path, int flags, mode_t mode) {
   if (Hit(SimCall::kOpen)) return -1;
+  // The library opens a node around every transfer: one lookup of the node,
+  // and the descriptor kept in the table itself.
   std::string name(path);
-  Node* node = Find(name);
+  auto found = nodes_.find(name);
   bool devMem = name == kDevMemPath && !(PassesThrough() && memory_.empty());
-  if (node == nullptr && !devMem && PassesThrough()) return Libc().open(HostPath(path).c_str(), flags, mode);
-  auto handle = std::make_unique<Handle>();
+  if (found == nodes_.end() && !devMem && PassesThrough())
+    return Libc().open(HostPath(path).c_str(), flags, mode);
+  Handle handle;
   if (devMem) {
-    handle->devMem = true;
+    handle.devMem = true;
   } else {
-    if (node == nullptr && (flags & O_CREAT) == 0) {
+    if (found == nodes_.end() && (flags & O_CREAT) == 0) {
       errno = ENOENT;
       return -1;
     }
     // A read-only MTD partition refuses an open for writing, as the kernel's.
-    if (node != nullptr && node->readOnly && (flags & O_ACCMODE) != O_RDONLY) {
+    if (found != nodes_.end() && found->second->readOnly && (flags & O_ACCMODE) != O_RDONLY) {
       errno = EACCES;
       return -1;
     }
-    if (node == nullptr) Create(name, SimKind::kFile, 0);
-    handle->node = nodes_[name];
-    handle->writable = (flags & O_ACCMODE) != O_RDONLY;
+    if (found == nodes_.end()) {
+      Create(name, SimKind::kFile, 0);
+      found = nodes_.find(name);
+    }
+    handle.node = found->second;
+    handle.writable = (flags & O_ACCMODE) != O_RDONLY;
   }
   int fd = firstFd_;
   if (PassesThrough()) {
@@ -514,7 +512,7 @@ int FlashSim::Open(const char* path, int flags, mode_t mode) {
     if (fd < 0) return fd;
   }
   while (handles_.count(fd) != 0) ++fd;
-  handles_[fd] = std::move(handle);
+  handles_.emplace(fd, std::move(handle));
   return fd;
 }
 
@@ -540,10 +538,10 @@ off64_t FlashSim::Seek(int fd, off64_t offset, int whence) {
     errno = EBADF;
     return -1;
   }
-  Node* node = it->second->node.get();
+  Node* node = it->second.node.get();
   uint64_t size = node == nullptr ? 0 : node->Size();
   int64_t base = whence == SEEK_SET ? 0
-                 : whence == SEEK_CUR ? static_cast<int64_t>(it->second->position)
+                 : whence == SEEK_CUR ? static_cast<int64_t>(it->second.position)
                                       : static_cast<int64_t>(size);
   int64_t target = base + offset;
   // The MTD character device refuses positions past its end.
@@ -551,7 +549,7 @@ off64_t FlashSim::Seek(int fd, off64_t offset, int whence) {
     errno = EINVAL;
     return -1;
   }
-  it->second->position = static_cast<uint64_t>(target);
+  it->second.position = static_cast<uint64_t>(target);
   return target;
 }
 
@@ -560,18 +558,18 @@ ssize_t FlashSim::DescriptorTransfer(SimCall call, int fd, Transfer transfer, Pa
   if (Hit(call)) return -1;
   auto it = handles_.find(fd);
   if (it == handles_.end() && PassesThrough()) return passThrough();
-  Node* node = it == handles_.end() ? nullptr : it->second->node.get();
+  Node* node = it == handles_.end() ? nullptr : it->second.node.get();
   if (node == nullptr) {
     errno = EBADF;
     return -1;
   }
   size_t done = 0;
-  int error = transfer(*node, it->second->position, &done);
+  int error = transfer(*node, it->second.position, &done);
   if (error != 0) {
     errno = error;
     return -1;
   }
-  it->second->position += done;
+  it->second.position += done;
   return static_cast<ssize_t>(done);
 }
 
@@ -584,7 +582,7 @@ ssize_t FlashSim::Read(int fd, void* buffer, size_t count) {
 
 ssize_t FlashSim::Write(int fd, const void* data, size_t count) {
   auto it = handles_.find(fd);
-  if (it != handles_.end() && !it->second->writable) {
+  if (it != handles_.end() && !it->second.writable) {
     errno = EBADF;
     return -1;
   }
@@ -604,13 +602,13 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
   if (Hit(SimCall::kIoctl, specific)) return -1;
   auto it = handles_.find(fd);
   if (it == handles_.end() && PassesThrough()) return Libc().ioctl(fd, request, argument);
-  Node* node = it == handles_.end() ? nullptr : it->second->node.get();
+  Node* node = it == handles_.end() ? nullptr : it->second.node.get();
   if (node == nullptr || !node->IsMtd()) {
     errno = node == nullptr ? EBADF : ENOTTY;
     return -1;
   }
   // Requests that change the device need a descriptor open for writing.
-  if ((specific == SimCall::kMemErase || specific == SimCall::kMemSetBadBlock) && !it->second->writable) {
+  if ((specific == SimCall::kMemErase || specific == SimCall::kMemSetBadBlock) && !it->second.writable) {
     errno = EPERM;
     return -1;
   }
@@ -649,7 +647,7 @@ void* FlashSim::Map(size_t length, int protection, int flags, int fd, off64_t of
   auto it = handles_.find(fd);
   if (it == handles_.end() && PassesThrough())
     return Libc().mmap64(nullptr, length, protection, flags, fd, offset);
-  if (it == handles_.end() || !it->second->devMem) {
+  if (it == handles_.end() || !it->second.devMem) {
     errno = EBADF;
     return MAP_FAILED;
   }

@@ -108,7 +108,14 @@ class FlashSim {
   void PassThrough(std::function<std::string(const char*)> hostPath);
 
   using Node = DeviceNode;
-  struct Handle;
+  // An open descriptor.
+  struct Handle {
+    // Null for /dev/mem. An open node outlives its unlinking, as a file does.
+    std::shared_ptr<Node> node;
+    uint64_t position = 0;
+    bool devMem = false;
+    bool writable = true;
+  };
   struct Fault;
 
   // Entry points of the bound seam table (public for the table only).
@@ -141,7 +148,7 @@ class FlashSim {
   os::SysCalls table_;
   std::unique_ptr<os::ScopedSysCalls> binding_;
   std::map<std::string, std::shared_ptr<Node>> nodes_;
-  std::map<int, std::unique_ptr<Handle>> handles_;
+  std::map<int, Handle> handles_;
   std::vector<std::unique_ptr<Fault>> faults_;
   std::vector<SimCall> failed_;
   std::array<int, static_cast<size_t>(SimCall::kCount)> counts_{};
