@@ -1,6 +1,8 @@
 // Extruder: the reading stream. Integers are read most significant byte first
 // from a memory buffer, a file, standard input, an eMMC device, a flash slot or
 // physical memory.
+// A NOR read reports no failure (kept as it is); bytes it could not read
+// arrive as erased flash (0xFF), never as whatever the caller's memory held.
 #ifndef STBPLAT_EXTRUDER_H
 #define STBPLAT_EXTRUDER_H
 

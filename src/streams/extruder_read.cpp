@@ -16,6 +16,8 @@ constexpr unsigned int kBitsPerByte = 8;
 constexpr unsigned int kMaxBitFieldWidth = 16;
 constexpr unsigned int kTopBitOfUnit = 0xFFFFFFFFu;
 constexpr unsigned int kWidestShift = 31;
+// What flash that was never written, or could not be read, holds.
+constexpr unsigned char kErasedFlashByte = 0xFF;
 
 template <typename T>
 T DecodeBigEndian(const unsigned char* bytes) {
@@ -53,7 +55,9 @@ unsigned int ReadMemory(Extruder& s, unsigned char* dst, unsigned int k, LogFn l
 unsigned int ReadSource(Extruder& s, unsigned char* dst, unsigned int k) {
   if (s.isNorFlash) {
     unsigned long address = s.norBaseOffset + reinterpret_cast<std::uintptr_t>(s.getP());
-    DeviceNorRead(address, dst, k);  // the NOR read reports nothing back
+    // The NOR read reports nothing back: what it cannot read stays erased.
+    std::memset(dst, kErasedFlashByte, k);
+    DeviceNorRead(address, dst, k);
     // The position is an offset held in the pointer, from null: it moves as
     // an integer.
     s.setP(reinterpret_cast<unsigned char*>(reinterpret_cast<std::uintptr_t>(s.getP()) + k));

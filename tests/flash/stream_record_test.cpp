@@ -168,6 +168,12 @@ TEST_F(RecordStreams, PaddingSizedPastTheFlashIsNotSkippedByWriting) {
   FSBLInfo info;
   EXPECT_EQ(info.ReadTLVAndData(in, nullptr), 0xA012u);
   EXPECT_TRUE(sim_.Bytes("/dev/mtd1", 0, 0x40000) == before);
+  // A NOR read that fails still reports nothing: the value is erased flash.
+  sim_.FailCall(SimCall::kRead, 1, EIO);
+  unsigned int value = 0;
+  Extruder again(&component, false);
+  again.extrude(&value);
+  EXPECT_EQ(value, 0xFFFFFFFFu);
 }
 
 TEST_F(RecordStreams, FailuresToOpenSayWhy) {
