@@ -223,8 +223,7 @@ void RegisterRecordCommands(CLI::App& app) {
       "show", "Decode a record (its type from its type code) and show its fields");
   showCommand->add_option("SOURCE", show.source, sourceHelp)->required();
   showCommand->add_option("-t,--type", show.type, "Read as this type: " + KindNames());
-  showCommand->add_option_function<std::string>(
-      "--at", [](const std::string& v) { show.at = ParseNumber(v, "--at"); }, "Offset of the record in the file");
+  AddNumberOption(showCommand, "--at", &show.at, "Offset of the record in the file or slot");
   showCommand->add_flag("--no-display", show.noDisplay, "Leave out the library's own display lines");
   SetAction(showCommand, []() { RunShow(show); });
 
@@ -233,8 +232,7 @@ void RegisterRecordCommands(CLI::App& app) {
       "check", "Check a record's framing, sizes and nested entries; report the first problem's offset");
   checkCommand->add_option("SOURCE", check.source, sourceHelp)->required();
   checkCommand->add_option("-t,--type", check.type, "Check as this type: " + KindNames());
-  checkCommand->add_option_function<std::string>(
-      "--at", [](const std::string& v) { check.at = ParseNumber(v, "--at"); }, "Offset of the record in the file");
+  AddNumberOption(checkCommand, "--at", &check.at, "Offset of the record in the file or slot");
   SetAction(checkCommand, []() { RunCheck(check); });
 
   CLI::App* make = record->add_subcommand("make", "Build a record from arguments");

@@ -6,6 +6,7 @@
 #include "output.h"
 #include "record_kinds.h"
 #include "stbplat/extruder.h"
+#include "stbplat/memory_map.h"
 #include "tool.h"
 
 namespace stbtool {
@@ -85,6 +86,12 @@ RecordSource LoadRecordSource(const std::string& source, unsigned long offset) {
     if (arg.hasOffset) throw UsageError("give the offset of '" + source + "' once, not also with --at");
     arg.offset = offset;
   }
+  Location slot = ToComponentLocation(arg).location;
+  unsigned long slotSize = 0, slotOffset = 0;
+  if (ExtendedMemoryMapStructure::Instance()->GetSlotSizeAndOffset(&slot, &slotSize, &slotOffset) &&
+      arg.offset >= slotSize)
+    throw UsageError((arg.hasOffset ? "SOURCE " + source + ": offset " : "--at ") + Hex(arg.offset) +
+                     " lies past the end of the slot (" + std::to_string(slotSize) + " bytes)");
   out.isLocation = true;
   out.base = arg.offset;
   out.bytes = ReadFromLocation(source, arg);
