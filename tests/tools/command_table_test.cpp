@@ -68,6 +68,10 @@ const Row kRows[] = {
     {{"record", "make", "package", "--header", "nand0.pkghdr.a", "--header-tag", "PKGH", "-c",
       "KRNL=NAND0.KERNEL.A+0x800", "-c", "ROOT=NAND0.ROOTFS.A", "-o", "@/pkg.bin"}, 0, kExactOut, ""},
     {{"record", "show", "--type", "package", "@/pkg.bin"}, 0, kOut, "slotOffset: 2048 (0x800)"},
+    // No known type code, and not shaped like a package header.
+    {{"--root", "@/device", "record", "show", "NOR0.BOOT.A", "--at", "0x10"}, 1, kErr,
+     "0x16 (package/packageHeaderLocation/deviceName): type code '??DA' (0x00004441) is no known record"},
+    {{"record", "check", "-"}, 1, kErr, "nor a package header: deviceName holds the byte 0x20 at 4", "PLAIN TEXT IS NO RECORD, NOR A PACKAGE HEADER"},
     // Conventions: help; usage errors exit 2 naming the argument.
     {{"--help"}, 0, kOut, "Usage:"},
     {{"frobnicate"}, 2, kErr, "frobnicate"},
