@@ -31,6 +31,8 @@ std::string Stream(bool altered) {
   return data;
 }
 const std::string kStream = Stream(false);
+// A package header whose device name is not UTF-8.
+const std::string kBadName = std::string("\0\0PKGHN\xFF\x80" "D0...KERNEL..A.......", 30) + std::string(12, '\0');
 
 enum Where { kOut, kErr, kExactOut };
 
@@ -71,6 +73,9 @@ const Row kRows[] = {
     // No known type code, and not shaped like a package header.
     {{"--root", "@/device", "record", "show", "NOR0.BOOT.A", "--at", "0x10"}, 1, kErr,
      "0x16 (package/packageHeaderLocation/deviceName): type code '??DA' (0x00004441) is no known record"},
+    {{"--json", "record", "show", "-"}, 1, kErr, "deviceName holds the byte 0xFF at 1", kBadName},
+    {{"--json", "record", "show", "--type", "package", "-"}, 0, kOut, "\"N\\\\xFF\\\\x80D0.KERNEL.A\"", kBadName},
+    {{"--json", "ini", "@/latin1.ini"}, 0, kOut, "\"name\": \"caf\\\\xE9\""},
     {{"record", "check", "-"}, 1, kErr, "nor a package header: deviceName holds the byte 0x20 at 4", "PLAIN TEXT IS NO RECORD, NOR A PACKAGE HEADER"},
     // Conventions: help; usage errors exit 2 naming the argument.
     {{"--help"}, 0, kOut, "Usage:"},
@@ -127,6 +132,7 @@ TEST(Commands, AnswerEachRow) {
   dir.Write("dump.bin", std::string("ABCDEFGHIJKLMNOPQ\0\x7f", 19));
   dir.Write("good.ini", "top = 1\n[net]\naddress = 10.0.0.1 ; home\nmask: 255.0.0.0\n");
   dir.Write("bad.ini", "[a]\nx = 1\n[broken\ny = 2\n");
+  dir.Write("latin1.ini", "name = caf\xE9\n");
   dir.Write("altered.bin", Stream(true));
   std::vector<unsigned char> nor = dir.Read(kNor);
   nor[0x10071] = 'X';  // the type of the first memory controller

@@ -9,6 +9,7 @@
 #include <cstring>
 #include <limits>
 
+#include "output.h"
 #include "tool.h"
 
 namespace stbtool {
@@ -23,10 +24,9 @@ bool IsNameChar(char c) {
 }
 
 std::string NameOf(const unsigned char* name) {
-  std::string text;
-  for (size_t i = 0; i < kNameWidth && name[i] != '.' && name[i] != 0; ++i)
-    text += static_cast<char>(name[i]);
-  return text;
+  size_t length = 0;
+  while (length < kNameWidth && name[length] != '.' && name[length] != 0) ++length;
+  return PrintableText(name, length);
 }
 
 }  // namespace

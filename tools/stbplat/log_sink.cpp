@@ -4,6 +4,8 @@
 #include <cstdio>
 #include <string>
 
+#include "output.h"
+
 namespace stbtool {
 namespace {
 
@@ -71,7 +73,7 @@ QuietLog::QuietLog(etLogUtilModuleId module) : module_(module), savedLevel_(subS
 
 QuietLog::~QuietLog() { subSystemLogLevel[module_] = savedLevel_; }
 
-std::string DisplayCapture::Text() const { return WithoutCarriageReturns(text_); }
+std::string DisplayCapture::Text() const { return PrintableLines(WithoutCarriageReturns(text_)); }
 
 }  // namespace stbtool
 
@@ -94,7 +96,7 @@ extern "C" void GlobalLogUtilAdd(etLogUtilModuleId moduleId, unsigned int level,
   bool taken = false;
   stbtool::Collect(stbtool::activeCapture, moduleId, level, text, &taken);
   if (taken || level > stbtool::ErrorLevel(moduleId)) return;
-  std::string shown = stbtool::WithoutCarriageReturns(text);
+  std::string shown = stbtool::PrintableLines(stbtool::WithoutCarriageReturns(text));
   if (!shown.empty() && shown.back() != '\n') shown += '\n';
   std::fprintf(stderr, "stbplat: library: %s", shown.c_str());
 }

@@ -24,7 +24,8 @@ class DisplayCapture {
   DisplayCapture(const DisplayCapture&) = delete;
   DisplayCapture& operator=(const DisplayCapture&) = delete;
 
-  // The collected text with "\r\n" line ends turned into "\n".
+  // The collected text with "\r\n" line ends turned into "\n" and other
+  // unprintable bytes escaped.
   std::string Text() const;
 
  private:
