@@ -31,6 +31,9 @@ std::string Stream(bool altered) {
   return data;
 }
 const std::string kStream = Stream(false);
+// A boot-loader record with 50 entries of an unknown type (0).
+const std::string kUnknownEntries = std::string("FSBL\0\0\x01\xB2\0\0\0\0VERS\0\0\0\x12", 20) + std::string(10, '\0') +
+                                    std::string("DATA\0\0\0\0\0\0\0\x32", 12) + std::string(400, '\0');
 // A package header whose device name is not UTF-8.
 const std::string kBadName = std::string("\0\0PKGHN\xFF\x80" "D0...KERNEL..A.......", 30) + std::string(12, '\0');
 
@@ -73,6 +76,7 @@ const Row kRows[] = {
     // No known type code, and not shaped like a package header.
     {{"--root", "@/device", "record", "show", "NOR0.BOOT.A", "--at", "0x10"}, 1, kErr,
      "0x16 (package/packageHeaderLocation/deviceName): type code '??DA' (0x00004441) is no known record"},
+    {{"record", "show", "-"}, 0, kErr, "FSBL info\nstbplat: library: last message repeated 49 times\n", kUnknownEntries},
     {{"--json", "record", "show", "-"}, 1, kErr, "deviceName holds the byte 0xFF at 1", kBadName},
     {{"--json", "record", "show", "--type", "package", "-"}, 0, kOut, "\"N\\\\xFF\\\\x80D0.KERNEL.A\"", kBadName},
     {{"--json", "ini", "@/latin1.ini"}, 0, kOut, "\"name\": \"caf\\\\xE9\""},

@@ -24,6 +24,11 @@ unsigned int ErrorLevel(etLogUtilModuleId module) {
   return module < eLogModuleCount ? errorLevels[module] : 0;
 }
 
+// The last message shown on standard error, and how often it came again
+// since.
+std::string lastShown;
+unsigned long repeats = 0;
+
 std::string WithoutCarriageReturns(const std::string& text) {
   std::string out;
   out.reserve(text.size());
@@ -44,6 +49,12 @@ void Collect(DisplayCapture* capture, etLogUtilModuleId module, unsigned int lev
       return;
     }
   }
+}
+
+void FlushLogRepeats() {
+  if (repeats > 0)
+    std::fprintf(stderr, "stbplat: library: last message repeated %lu time%s\n", repeats, repeats == 1 ? "" : "s");
+  repeats = 0;
 }
 
 void SetErrorLogLevel(unsigned int level) {
@@ -98,5 +109,11 @@ extern "C" void GlobalLogUtilAdd(etLogUtilModuleId moduleId, unsigned int level,
   if (taken || level > stbtool::ErrorLevel(moduleId)) return;
   std::string shown = stbtool::PrintableLines(stbtool::WithoutCarriageReturns(text));
   if (!shown.empty() && shown.back() != '\n') shown += '\n';
+  if (shown == stbtool::lastShown) {
+    ++stbtool::repeats;
+    return;
+  }
+  stbtool::FlushLogRepeats();
+  stbtool::lastShown = shown;
   std::fprintf(stderr, "stbplat: library: %s", shown.c_str());
 }
