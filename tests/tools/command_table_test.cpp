@@ -80,7 +80,8 @@ const Row kRows[] = {
     {{"--json", "record", "show", "-"}, 1, kErr, "deviceName holds the byte 0xFF at 1", kBadName},
     {{"--json", "record", "show", "--type", "package", "-"}, 0, kOut, "\"N\\\\xFF\\\\x80D0.KERNEL.A\"", kBadName},
     {{"--json", "ini", "@/latin1.ini"}, 0, kOut, "\"name\": \"caf\\\\xE9\""},
-    {{"record", "check", "-"}, 1, kErr, "nor a package header: deviceName holds the byte 0x20 at 4", "PLAIN TEXT IS NO RECORD, NOR A PACKAGE HEADER"},
+    {{"record", "check", "-"}, 1, kErr, "nor a package header: deviceName holds the byte 0x20 at 4",
+     "PLAIN TEXT IS NO RECORD, NOR A PACKAGE HEADER"},
     // Conventions: help; usage errors exit 2 naming the argument.
     {{"--help"}, 0, kOut, "Usage:"},
     {{"frobnicate"}, 2, kErr, "frobnicate"},

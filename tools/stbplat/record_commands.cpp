@@ -66,10 +66,10 @@ std::string ErrorText(const CheckIssue& error) {
 }
 
 const char* const kPackageHelp =
-    "A package header has no type code: bytes that start with no known type code are taken for one only "
-    "when they have its shape: 42 bytes and 36 more for each of at most 16 components, tags of up to 4 "
-    "printable characters padded with zero bytes, and location names of 1 to 8 of A-Z, 0-9, '_', '-' "
-    "padded with '.'. Other bytes are reported as no known record (exit 1).";
+    "A package header has no type code: bytes that start with no known type code are taken for one\n"
+    "only when they have its shape: 42 bytes and 36 more for each of at most 16 components, tags of up\n"
+    "to 4 printable characters padded with zero bytes, and location names of 1 to 8 of A-Z, 0-9, '_',\n"
+    "'-' padded with '.'. Other bytes are reported as no known record (exit 1).\n";
 
 struct ShowArgs {
   std::string source;
@@ -241,7 +241,7 @@ void RegisterRecordCommands(CLI::App& app) {
   showCommand->add_option("SOURCE", show.source, sourceHelp)->required();
   showCommand->add_option("-t,--type", show.type, "Read as this type: " + KindNames());
   AddNumberOption(showCommand, "--at", &show.at, "Offset of the record in the file or slot");
-  showCommand->footer(std::string(kPackageHelp) + " --type package reads any bytes as a package header.");
+  showCommand->footer(std::string(kPackageHelp) + "--type package reads any bytes as a package header.");
   showCommand->add_flag("--no-display", show.noDisplay, "Leave out the library's own display lines");
   SetAction(showCommand, []() { RunShow(show); });
 
@@ -251,7 +251,7 @@ void RegisterRecordCommands(CLI::App& app) {
   checkCommand->add_option("SOURCE", check.source, sourceHelp)->required();
   checkCommand->add_option("-t,--type", check.type, "Check as this type: " + KindNames());
   AddNumberOption(checkCommand, "--at", &check.at, "Offset of the record in the file or slot");
-  checkCommand->footer(std::string(kPackageHelp) + " With --type package the same rules are checked.");
+  checkCommand->footer(std::string(kPackageHelp) + "With --type package the same rules are checked.");
   SetAction(checkCommand, []() { RunCheck(check); });
 
   CLI::App* make = record->add_subcommand("make", "Build a record from arguments");
