@@ -31,6 +31,11 @@ std::string Stream(bool altered) {
   return data;
 }
 const std::string kStream = Stream(false);
+// A boot-loader record with 50 entries of an unknown type (0).
+const std::string kUnknownEntries = std::string("FSBL\0\0\x01\xB2\0\0\0\0VERS\0\0\0\x12", 20) + std::string(10, '\0') +
+                                    std::string("DATA\0\0\0\0\0\0\0\x32", 12) + std::string(400, '\0');
+// A package header whose device name is not UTF-8.
+const std::string kBadName = std::string("\0\0PKGHN\xFF\x80" "D0...KERNEL..A.......", 30) + std::string(12, '\0');
 
 enum Where { kOut, kErr, kExactOut, kExactErr };
 
@@ -68,6 +73,15 @@ const Row kRows[] = {
     {{"record", "make", "package", "--header", "nand0.pkghdr.a", "--header-tag", "PKGH", "-c",
       "KRNL=NAND0.KERNEL.A+0x800", "-c", "ROOT=NAND0.ROOTFS.A", "-o", "@/pkg.bin"}, 0, kExactOut, ""},
     {{"record", "show", "--type", "package", "@/pkg.bin"}, 0, kOut, "slotOffset: 2048 (0x800)"},
+    // No known type code, and not shaped like a package header.
+    {{"--root", "@/device", "record", "show", "NOR0.BOOT.A", "--at", "0x10"}, 1, kErr,
+     "0x16 (package/packageHeaderLocation/deviceName): type code '??DA' (0x00004441) is no known record"},
+    {{"record", "show", "-"}, 0, kErr, "FSBL info\nstbplat: library: last message repeated 49 times\n", kUnknownEntries},
+    {{"--json", "record", "show", "-"}, 1, kErr, "deviceName holds the byte 0xFF at 1", kBadName},
+    {{"--json", "record", "show", "--type", "package", "-"}, 0, kOut, "\"N\\\\xFF\\\\x80D0.KERNEL.A\"", kBadName},
+    {{"--json", "ini", "@/latin1.ini"}, 0, kOut, "\"name\": \"caf\\\\xE9\""},
+    {{"record", "check", "-"}, 1, kErr, "nor a package header: deviceName holds the byte 0x20 at 4",
+     "PLAIN TEXT IS NO RECORD, NOR A PACKAGE HEADER"},
     // Conventions: help; usage errors exit 2 naming the argument.
     {{"--help"}, 0, kOut, "Usage:"},
     {{"frobnicate"}, 2, kErr, "frobnicate"},
@@ -78,6 +92,10 @@ const Row kRows[] = {
     {{"-q", "--root", "@/device", "record", "show", "NOR0.PANL.A"}, 1, kExactErr,
      "stbplat: cannot open location NOR0.PANL.A\n"},
     {{"hexdump", "--indent", "500", "x"}, 2, kErr, "--indent"},
+    {{"hexdump", "-n", "-1", "@/dump.bin"}, 2, kErr, "--length: '-1' is not a number"},
+    {{"record", "show", kNor, "--at", "-5"}, 2, kErr, "--at: '-5' is not a number"},
+    {{"record", "check", kNor, "--at", "1.5"}, 2, kErr, "--at: '1.5' is not a number"},
+    {{"record", "show", kNor, "--at", "0x400000000G"}, 2, kErr, "--at: '0x400000000G' is too large"},
     {{"disk", "info", "/dev/sda"}, 2, kErr, "/dev/sda"},
     {{"--root", "@", "crc16", "-"}, 2, kErr, "proc/mtd", "x"},
     {{"record", "show", "NAND0.KERNELIMAGE.A"}, 2, kErr, "'KERNELIMAGE'"},
@@ -105,7 +123,7 @@ const Row kRows[] = {
     {{"--root", "@/device", "flash", "erase", "NOR0.BOOT.A"}, 2, kErr, "add --yes to go ahead"},
     {{"--root", "@/device", "flash", "erase", "NOR0.NOPE.A", "--yes"}, 1, kErr, "NOR0.NOPE.A"},
     {{"--root", "@/device", "flash", "read", "NOR0.BOOT.A", "-n", "1M", "-o", "@/x"}, 2, kErr,
-     "--length 1M runs past the end of NOR0.BOOT.A (65536 bytes left)"},
+     "--length 0x100000 runs past the end of NOR0.BOOT.A (65536 bytes left)"},
     {{"--root", "@/device", "flash", "write", "NOR0.BOOT.A", "@/long.bin", "--yes"}, 2, kErr,
      "(70000 bytes) does not fit in NOR0.BOOT.A (65536 bytes left)"},
     // A new front-panel text goes into its slot.
@@ -128,6 +146,7 @@ TEST(Commands, AnswerEachRow) {
   dir.Write("dump.bin", std::string("ABCDEFGHIJKLMNOPQ\0\x7f", 19));
   dir.Write("good.ini", "top = 1\n[net]\naddress = 10.0.0.1 ; home\nmask: 255.0.0.0\n");
   dir.Write("bad.ini", "[a]\nx = 1\n[broken\ny = 2\n");
+  dir.Write("latin1.ini", "name = caf\xE9\n");
   dir.Write("altered.bin", Stream(true));
   std::vector<unsigned char> nor = dir.Read(kNor);
   nor[0x10071] = 'X';  // the type of the first memory controller

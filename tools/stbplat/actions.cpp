@@ -4,8 +4,10 @@
 
 #include <cstdio>
 #include <exception>
+#include <string>
 #include <utility>
 
+#include "log_sink.h"
 #include "tool.h"
 
 namespace stbtool {
@@ -24,19 +26,20 @@ void SetAction(CLI::App* command, std::function<void()> action) {
 
 int RunPendingAction() {
   if (!Pending()) return kExitUsage;
+  int code = kExitOk;
+  std::string message;
   try {
     Pending()();
   } catch (const UsageError& e) {
-    std::fprintf(stderr, "stbplat: %s\n", e.what());
-    return kExitUsage;
-  } catch (const Failure& e) {
-    std::fprintf(stderr, "stbplat: %s\n", e.what());
-    return kExitFailed;
-  } catch (const std::exception& e) {
-    std::fprintf(stderr, "stbplat: %s\n", e.what());
-    return kExitFailed;
+    code = kExitUsage;
+    message = e.what();
+  } catch (const std::exception& e) {  // Failure, and anything unforeseen
+    code = kExitFailed;
+    message = e.what();
   }
-  return kExitOk;
+  FlushLogRepeats();
+  if (code != kExitOk) std::fprintf(stderr, "stbplat: %s\n", message.c_str());
+  return code;
 }
 
 }  // namespace stbtool

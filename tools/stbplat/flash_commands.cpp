@@ -304,16 +304,16 @@ struct TransferArgs {
   bool yes = false;
   bool erase = false;
   bool verify = false;
-  std::string length;
+  unsigned long length = 0;
+  bool hasLength = false;
 };
 
 void RunRead(const TransferArgs& args) {
   Target t = ParseTarget(args.target, args.mtd, "flash read");
-  unsigned long length = 0;
-  if (!args.length.empty()) {
-    length = ParseNumber(args.length, "flash read --length");
+  unsigned long length = args.length;
+  if (args.hasLength) {
     if (t.roomKnown && length > t.room)
-      throw UsageError("flash read: --length " + args.length + " runs past the end of " + t.text + " (" +
+      throw UsageError("flash read: --length " + Hex(length) + " runs past the end of " + t.text + " (" +
                        std::to_string(t.room) + " bytes left)");
   } else if (t.roomKnown) {
     length = t.room;
@@ -394,7 +394,8 @@ void RunWrite(const TransferArgs& args) {
 struct EraseArgs {
   std::string target;
   bool yes = false;
-  std::string length;
+  unsigned long length = 0;
+  bool hasLength = false;
 };
 
 void RunErase(const EraseArgs& args, bool sectorOnly) {
@@ -407,8 +408,8 @@ void RunErase(const EraseArgs& args, bool sectorOnly) {
     if (sectorOnly) {
       ok = flash->EraseNORSector(t.address);
     } else {
-      if (args.length.empty()) throw UsageError(command + ": give --length to erase by address");
-      ok = flash->NORErase(t.address, ParseNumber(args.length, command + " --length"));
+      if (!args.hasLength) throw UsageError(command + ": give --length to erase by address");
+      ok = flash->NORErase(t.address, args.length);
     }
   } else {
     if (t.location.hasOffset) throw UsageError(command + ": " + t.text + ": slots are erased whole, without an offset");
@@ -462,7 +463,8 @@ void RegisterFlashCommands(CLI::App& app) {
   CLI::App* readCommand = flash->add_subcommand("read", "Copy bytes from flash to a file");
   readCommand->add_option("TARGET", read.target, targetHelp)->required();
   readCommand->add_option("-o,--output", read.file, "Output file (- for standard output)");
-  readCommand->add_option("-n,--length", read.length, "Bytes to read (default: to the end of the partition)");
+  AddNumberOption(readCommand, "-n,--length", &read.length, "Bytes to read (default: to the end of the partition)",
+                  &read.hasLength);
   readCommand->add_flag("--mtd", read.mtd, "TARGET names an MTD partition");
   SetAction(readCommand, []() { RunRead(read); });
 
@@ -481,7 +483,8 @@ void RegisterFlashCommands(CLI::App& app) {
   static EraseArgs erase;
   CLI::App* eraseCommand = flash->add_subcommand("erase", "Erase a whole slot, or NOR bytes from an address");
   eraseCommand->add_option("TARGET", erase.target, "DEVICE.PARTITION.SLOT or a NOR address")->required();
-  eraseCommand->add_option("-n,--length", erase.length, "Bytes to erase from a NOR address (whole sectors)");
+  AddNumberOption(eraseCommand, "-n,--length", &erase.length, "Bytes to erase from a NOR address (whole sectors)",
+                  &erase.hasLength);
   eraseCommand->add_flag("-y,--yes", erase.yes, "Confirm: change the device");
   SetAction(eraseCommand, []() { RunErase(erase, false); });
 

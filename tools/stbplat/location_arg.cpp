@@ -1,11 +1,15 @@
 #include "location_arg.h"
 
+#include <CLI/CLI.hpp>
+
 #include <algorithm>
 #include <cctype>
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <limits>
 
+#include "output.h"
 #include "tool.h"
 
 namespace stbtool {
@@ -20,33 +24,54 @@ bool IsNameChar(char c) {
 }
 
 std::string NameOf(const unsigned char* name) {
-  std::string text;
-  for (size_t i = 0; i < kNameWidth && name[i] != '.' && name[i] != 0; ++i)
-    text += static_cast<char>(name[i]);
-  return text;
+  size_t length = 0;
+  while (length < kNameWidth && name[length] != '.' && name[length] != 0) ++length;
+  return PrintableText(name, length);
 }
 
 }  // namespace
 
 unsigned long ParseNumber(const std::string& text, const std::string& what) {
-  if (text.empty() || text[0] == '-') throw UsageError(what + ": '" + text + "' is not a number");
+  const std::string bad = what + ": '" + text + "' is not a number";
+  // strtoul would skip blanks and take a sign: a number starts with a digit.
+  if (text.empty() || !std::isdigit(static_cast<unsigned char>(text[0]))) throw UsageError(bad);
   errno = 0;
   char* end = nullptr;
   unsigned long value = std::strtoul(text.c_str(), &end, 0);
-  if (end == text.c_str() || errno != 0) throw UsageError(what + ": '" + text + "' is not a number");
+  if (errno == ERANGE) throw UsageError(what + ": '" + text + "' is too large");
   unsigned long scale = 1;
   if (*end != '\0') {
     char suffix = static_cast<char>(std::toupper(static_cast<unsigned char>(*end)));
     if (suffix == 'K') scale = kKiB;
     else if (suffix == 'M') scale = kKiB * kKiB;
     else if (suffix == 'G') scale = kKiB * kKiB * kKiB;
-    else throw UsageError(what + ": '" + text + "' is not a number");
+    else throw UsageError(bad);
     ++end;
     if (*end == 'i' || *end == 'I') ++end;
     if (*end == 'B' || *end == 'b') ++end;
-    if (*end != '\0') throw UsageError(what + ": '" + text + "' is not a number");
+    if (*end != '\0') throw UsageError(bad);
   }
+  if (value > std::numeric_limits<unsigned long>::max() / scale)
+    throw UsageError(what + ": '" + text + "' is too large");
   return value * scale;
+}
+
+CLI::Option* AddNumberOption(CLI::App* app, const std::string& names, unsigned long* value,
+                             const std::string& help, bool* given) {
+  const std::string name = names.substr(names.rfind(',') + 1);
+  return app
+      ->add_option_function<std::string>(
+          names,
+          [=](const std::string& text) {
+            try {
+              *value = ParseNumber(text, name);
+            } catch (const UsageError& e) {
+              throw CLI::ValidationError(e.what());
+            }
+            if (given != nullptr) *given = true;
+          },
+          help + " (0x.. hex; K, M, G suffixes)")
+      ->type_name("NUMBER");
 }
 
 bool ParseLocationArg(const std::string& text, const std::string& what, LocationArg* out) {

@@ -8,6 +8,11 @@
 
 #include "stbplat/component_location.h"
 
+namespace CLI {
+class App;
+class Option;
+}
+
 namespace stbtool {
 
 struct LocationArg {
@@ -28,8 +33,15 @@ ComponentLocation ToComponentLocation(const LocationArg& arg, const std::string&
 std::string LocationText(const Location& location);
 
 // Parses a number in C notation (0x.., 0.., decimal) with an optional K, M
-// or G suffix (powers of 1024). Throws UsageError naming `what`.
+// or G suffix (powers of 1024). Throws UsageError naming `what`, also for a
+// value that does not fit in 64 bits.
 unsigned long ParseNumber(const std::string& text, const std::string& what);
+
+// An option (such as "-n,--length") whose value ParseNumber reads into
+// *value. A bad value stops the parsing with an error naming the option's
+// long name (exit 2); *given, if set, tells whether the option came.
+CLI::Option* AddNumberOption(CLI::App* app, const std::string& names, unsigned long* value,
+                             const std::string& help, bool* given = nullptr);
 
 }  // namespace stbtool
 

@@ -4,6 +4,8 @@
 #include <cstdio>
 #include <string>
 
+#include "output.h"
+
 namespace stbtool {
 namespace {
 
@@ -21,6 +23,11 @@ unsigned int ErrorLevel(etLogUtilModuleId module) {
   }
   return module < eLogModuleCount ? errorLevels[module] : 0;
 }
+
+// The last message shown on standard error, and how often it came again
+// since.
+std::string lastShown;
+unsigned long repeats = 0;
 
 std::string WithoutCarriageReturns(const std::string& text) {
   std::string out;
@@ -42,6 +49,12 @@ void Collect(DisplayCapture* capture, etLogUtilModuleId module, unsigned int lev
       return;
     }
   }
+}
+
+void FlushLogRepeats() {
+  if (repeats > 0)
+    std::fprintf(stderr, "stbplat: library: last message repeated %lu time%s\n", repeats, repeats == 1 ? "" : "s");
+  repeats = 0;
 }
 
 void SetErrorLogLevel(unsigned int level) {
@@ -71,7 +84,7 @@ QuietLog::QuietLog(etLogUtilModuleId module) : module_(module), savedLevel_(subS
 
 QuietLog::~QuietLog() { subSystemLogLevel[module_] = savedLevel_; }
 
-std::string DisplayCapture::Text() const { return WithoutCarriageReturns(text_); }
+std::string DisplayCapture::Text() const { return PrintableLines(WithoutCarriageReturns(text_)); }
 
 }  // namespace stbtool
 
@@ -94,7 +107,13 @@ extern "C" void GlobalLogUtilAdd(etLogUtilModuleId moduleId, unsigned int level,
   bool taken = false;
   stbtool::Collect(stbtool::activeCapture, moduleId, level, text, &taken);
   if (taken || level > stbtool::ErrorLevel(moduleId)) return;
-  std::string shown = stbtool::WithoutCarriageReturns(text);
+  std::string shown = stbtool::PrintableLines(stbtool::WithoutCarriageReturns(text));
   if (!shown.empty() && shown.back() != '\n') shown += '\n';
+  if (shown == stbtool::lastShown) {
+    ++stbtool::repeats;
+    return;
+  }
+  stbtool::FlushLogRepeats();
+  stbtool::lastShown = shown;
   std::fprintf(stderr, "stbplat: library: %s", shown.c_str());
 }

@@ -15,6 +15,12 @@ namespace stbtool {
 // Sets the level of every module for messages on standard error.
 void SetErrorLogLevel(unsigned int level);
 
+// A library message that comes again right behind itself is not shown
+// again, only counted; this writes "last message repeated N times" for the
+// count not yet told (at the next other message, and before the tool's own
+// last word).
+void FlushLogRepeats();
+
 // While alive, the module's display lines are collected (the module's level is
 // raised to display for that time) and not printed.
 class DisplayCapture {
@@ -24,7 +30,8 @@ class DisplayCapture {
   DisplayCapture(const DisplayCapture&) = delete;
   DisplayCapture& operator=(const DisplayCapture&) = delete;
 
-  // The collected text with "\r\n" line ends turned into "\n".
+  // The collected text with "\r\n" line ends turned into "\n" and other
+  // unprintable bytes escaped.
   std::string Text() const;
 
  private:

@@ -3,6 +3,7 @@
 // on every level. Exit codes: 0 done, 1 the operation failed, 2 bad usage.
 #include <CLI/CLI.hpp>
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
@@ -25,6 +26,9 @@ GlobalOptions& Options() {
 }
 
 namespace {
+
+// -v steps from errors (2) up to traces (6).
+constexpr int kMostVerbose = eLogLevelTrace - eLogLevelError;
 
 int Run(int argc, char** argv) {
   CLI::App app{
@@ -83,9 +87,19 @@ int Run(int argc, char** argv) {
       app.exit(e);
     }
     return kExitUsage;
+  } catch (const std::exception& e) {
+    // No option handler should throw anything else; if one does, it is
+    // still a bad argument, not a reason to abort.
+    std::fprintf(stderr, "stbplat: %s\n", e.what());
+    return kExitUsage;
   }
 
-  if (options.verbose > 0) SetErrorLogLevel(eLogLevelError + static_cast<unsigned>(options.verbose));
+  if (options.verbose < 0) {
+    std::fprintf(stderr, "stbplat: --verbose: %d is below 0\n", options.verbose);
+    return kExitUsage;
+  }
+  if (options.verbose > 0)
+    SetErrorLogLevel(eLogLevelError + static_cast<unsigned>(std::min(options.verbose, kMostVerbose)));
   if (options.quiet) SetErrorLogLevel(0);
 
   if (!options.root.empty()) {

@@ -21,9 +21,61 @@ constexpr unsigned long kProgressThreshold = 256 * 1024;
 constexpr int kProgressWidth = 40;
 constexpr unsigned long kKiB = 1024;
 
+std::string Escaped(unsigned char c) {
+  char escaped[8];
+  std::snprintf(escaped, sizeof escaped, "\\x%02X", c);
+  return escaped;
+}
+
+// Length of the well-formed UTF-8 sequence at text[i], 0 if there is none.
+size_t Utf8Length(const std::string& text, size_t i) {
+  const auto c = static_cast<unsigned char>(text[i]);
+  if (c < 0x80) return 1;
+  size_t n = c >= 0xC2 && c <= 0xDF ? 2 : c >= 0xE0 && c <= 0xEF ? 3 : c >= 0xF0 && c <= 0xF4 ? 4 : 0;
+  if (n == 0 || text.size() - i < n) return 0;
+  // The second byte's range rules out overlong forms, surrogates and values
+  // above U+10FFFF.
+  const auto second = static_cast<unsigned char>(text[i + 1]);
+  unsigned char low = c == 0xE0 ? 0xA0 : c == 0xF0 ? 0x90 : 0x80;
+  unsigned char high = c == 0xED ? 0x9F : c == 0xF4 ? 0x8F : 0xBF;
+  if (second < low || second > high) return 0;
+  for (size_t k = 2; k < n; ++k)
+    if ((static_cast<unsigned char>(text[i + k]) & 0xC0) != 0x80) return 0;
+  return n;
+}
+
+std::string ValidUtf8(const std::string& text) {
+  std::string out;
+  for (size_t i = 0; i < text.size();) {
+    size_t n = Utf8Length(text, i);
+    if (n == 0) {
+      out += Escaped(static_cast<unsigned char>(text[i++]));
+    } else {
+      out.append(text, i, n);
+      i += n;
+    }
+  }
+  return out;
+}
+
+Json WithValidUtf8(const Json& value) {
+  if (value.is_string()) return ValidUtf8(value.get_ref<const std::string&>());
+  if (value.is_array()) {
+    Json out = Json::array();
+    for (const Json& item : value) out.push_back(WithValidUtf8(item));
+    return out;
+  }
+  if (value.is_object()) {
+    Json out = Json::object();
+    for (auto it = value.begin(); it != value.end(); ++it) out[ValidUtf8(it.key())] = WithValidUtf8(it.value());
+    return out;
+  }
+  return value;
+}
+
 }  // namespace
 
-void PrintJson(const Json& value) { std::cout << value.dump(2) << "\n"; }
+void PrintJson(const Json& value) { std::cout << WithValidUtf8(value).dump(2) << "\n"; }
 
 std::string Hex(unsigned long value, int digits) {
   char text[32];
@@ -60,15 +112,18 @@ std::string PrintableText(const unsigned char* data, size_t length) {
   std::string text;
   for (size_t i = 0; i < length && data[i] != 0; ++i) {
     unsigned char c = data[i];
-    if (std::isprint(c)) {
-      text += static_cast<char>(c);
-    } else {
-      char escaped[8];
-      std::snprintf(escaped, sizeof escaped, "\\x%02X", c);
-      text += escaped;
-    }
+    text += std::isprint(c) ? std::string(1, static_cast<char>(c)) : Escaped(c);
   }
   return text;
+}
+
+std::string PrintableLines(const std::string& text) {
+  std::string out;
+  for (char c : text) {
+    const auto byte = static_cast<unsigned char>(c);
+    out += std::isprint(byte) || c == '\n' ? std::string(1, c) : Escaped(byte);
+  }
+  return out;
 }
 
 std::vector<unsigned char> ReadWholeFile(const std::string& path) {

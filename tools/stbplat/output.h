@@ -15,6 +15,8 @@ namespace stbtool {
 
 using Json = nlohmann::ordered_json;
 
+// Prints the value; text in it that is not UTF-8 (file names, names read
+// from records) is first escaped byte by byte as "\xNN".
 void PrintJson(const Json& value);
 
 // "0x1A2B" with at least `digits` hexadecimal digits.
@@ -25,6 +27,8 @@ std::string HumanSize(unsigned long bytes);
 std::string TypeCodeText(unsigned int code);
 // Bytes as text, stopping at the first zero; unprintable bytes escaped.
 std::string PrintableText(const unsigned char* data, size_t length);
+// Lines of text with every unprintable byte but the line end escaped.
+std::string PrintableLines(const std::string& text);
 
 // Reads a whole file ("-" reads standard input). Throws Failure.
 std::vector<unsigned char> ReadWholeFile(const std::string& path);

@@ -20,7 +20,8 @@ constexpr unsigned char kNewLayoutMinor = 6;
 constexpr size_t kReloadErrorBytes = 8;
 constexpr size_t kDeviceConfigBytes = 4;
 constexpr size_t kBuildConfigFixed = 20;
-constexpr size_t kLocationBytes = 24;
+constexpr size_t kNameBytes = 8;
+constexpr size_t kTagBytes = 4;
 constexpr size_t kComponentBytes = 36;
 constexpr size_t kPackageFixed = 42;
 constexpr unsigned kMaxComponents = 16;
@@ -37,7 +38,20 @@ class Checker {
     if (kind == RecordKind::kUnknown) {
       if (size_ < 4) Error(0, "", "a record needs at least 4 bytes, the input has " + std::to_string(size_));
       const RecordKindInfo* info = KindByCode(U32(0));
-      kind = info ? info->kind : RecordKind::kPackageHeader;
+      if (info == nullptr) {
+        // A package header has no type code: only its shape tells it.
+        result_->kind = RecordKind::kPackageHeader;
+        try {
+          result_->end = PackageHeader(0, size_, "package");
+        } catch (const Stop&) {
+          result_->issues.back().message = "type code '" + Code(U32(0)) + "' (" + Hex(U32(0), 8) +
+                                           ") is no known record, nor a package header: " +
+                                           result_->issues.back().message;
+          throw;
+        }
+        return;
+      }
+      kind = info->kind;
     }
     result_->kind = kind;
     if (kind == RecordKind::kPackageHeader) {
@@ -236,19 +250,45 @@ class Checker {
     }
   }
 
+  static bool NameChar(unsigned char c) {
+    return (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' || c == '-';
+  }
+
+  // Three names as the library stores them: 1 to 8 of A-Z, 0-9, '_' and
+  // '-', padded to 8 with '.'.
   void Names(size_t at, const std::string& where) {
-    for (size_t i = 0; i < kLocationBytes; ++i) {
-      unsigned char c = data_[at + i];
-      if (c != 0 && !std::isprint(c)) {
-        Warn(at + i, where, "location name holds the byte " + Hex(c, 2));
-        return;
-      }
+    static const char* const fields[] = {"deviceName", "partitionName", "slotName"};
+    for (size_t n = 0; n < 3; ++n, at += kNameBytes) {
+      size_t i = 0;
+      while (i < kNameBytes && NameChar(data_[at + i])) ++i;
+      size_t length = i;
+      while (i < kNameBytes && data_[at + i] == '.') ++i;
+      if (length == 0) i = 0;
+      if (i < kNameBytes)
+        Error(at + i, where + "/" + fields[n],
+              std::string(fields[n]) + " holds the byte " + Hex(data_[at + i], 2) + " at " + std::to_string(i) +
+                  ": a name is 1 to 8 of A-Z, 0-9, '_', '-', padded with '.'");
     }
+  }
+
+  // Up to 4 printable characters, padded with zero bytes.
+  void Tag(size_t at, const std::string& where) {
+    size_t i = 0;
+    while (i < kTagBytes && std::isprint(data_[at + i])) ++i;
+    while (i < kTagBytes && data_[at + i] == 0) ++i;
+    if (i < kTagBytes)
+      Error(at + i, where, "componentTag holds the byte " + Hex(data_[at + i], 2) + " at " + std::to_string(i) +
+                               ": a tag is up to 4 printable characters, padded with zero bytes");
+  }
+
+  void Component(size_t at, const std::string& where) {
+    Tag(at, where);
+    Names(at + kTagBytes, where);
   }
 
   size_t PackageHeader(size_t at, size_t end, const std::string& where) {
     Need(at, end, kPackageFixed, where, "a package header");
-    Names(at + 2 + 4, where + "/packageHeaderLocation");
+    Component(at + 2, where + "/packageHeaderLocation");
     unsigned int count = U32(at + 38);
     if (count > kMaxComponents)
       Error(at + 38, where, "numComponents " + std::to_string(count) + " is more than " +
@@ -258,8 +298,7 @@ class Checker {
       Error(at + 38, where, "numComponents " + std::to_string(count) + " needs " + std::to_string(need) +
                                 " bytes, only " + std::to_string(end - at) + " in the input");
     for (unsigned int i = 0; i < count; ++i)
-      Names(at + kPackageFixed + i * kComponentBytes + 4,
-            where + "/componentLocations[" + std::to_string(i) + "]");
+      Component(at + kPackageFixed + i * kComponentBytes, where + "/componentLocations[" + std::to_string(i) + "]");
     return at + need;
   }
 

@@ -31,7 +31,10 @@ struct CheckResult {
 
 // Checks the record at data[0]; `base` is the offset of data[0] in the
 // input, added to every offset reported. kind kUnknown detects the type from
-// the type code (no known code: a package header is tried).
+// the type code; with no known code the bytes must pass as a package header:
+// its size and count, tags of up to 4 printable characters padded with zero
+// bytes, and location names in the library's form (1 to 8 of A-Z, 0-9, '_'
+// and '-', padded with '.'); an error then says the type code is unknown.
 CheckResult CheckRecord(const unsigned char* data, size_t size, unsigned long base, RecordKind kind);
 
 }  // namespace stbtool

@@ -59,6 +59,18 @@ void RefuseErased(const RecordSource& source, RecordKind wanted, const std::stri
                 " is erased (0xFF bytes): no record there");
 }
 
+// "error at offset 0x2A (package/componentLocations[0]): ...".
+std::string ErrorText(const CheckIssue& error) {
+  return "error at offset " + Hex(error.offset) + (error.where.empty() ? "" : " (" + error.where + ")") + ": " +
+         error.message;
+}
+
+const char* const kPackageHelp =
+    "A package header has no type code: bytes that start with no known type code are taken for one\n"
+    "only when they have its shape: 42 bytes and 36 more for each of at most 16 components, tags of up\n"
+    "to 4 printable characters padded with zero bytes, and location names of 1 to 8 of A-Z, 0-9, '_',\n"
+    "'-' padded with '.'. Other bytes are reported as no known record (exit 1).\n";
+
 struct ShowArgs {
   std::string source;
   std::string type;
@@ -70,6 +82,12 @@ void RunShow(const ShowArgs& args) {
   RecordKind wanted = KindOption(args.type);
   RecordSource source = LoadRecordSource(args.source, args.at);
   RefuseErased(source, wanted, "record show");
+  if (wanted == RecordKind::kUnknown) {
+    CheckResult detected = CheckRecord(source.bytes.data(), source.bytes.size(), source.base, wanted);
+    const CheckIssue* error = detected.firstError();
+    if (error != nullptr && (detected.kind == RecordKind::kPackageHeader || detected.kind == RecordKind::kUnknown))
+      throw Failure("record show: " + source.label + ": " + ErrorText(*error));
+  }
   DecodedRecord record = DecodeRecord(source.bytes, wanted);
   const RecordKindInfo& info = KindInfo(record.kind);
   if (Options().json) {
@@ -121,8 +139,7 @@ void RunCheck(const CheckArgs& args) {
                 << "\n";
   }
   if (const CheckIssue* error = result.firstError())
-    throw Failure("record check: " + source.label + ": error at offset " + Hex(error->offset) +
-                  (error->where.empty() ? "" : " (" + error->where + ")") + ": " + error->message);
+    throw Failure("record check: " + source.label + ": " + ErrorText(*error));
 }
 
 // Writes a built record to -o FILE, or to standard output when it is not
@@ -223,8 +240,8 @@ void RegisterRecordCommands(CLI::App& app) {
       "show", "Decode a record (its type from its type code) and show its fields");
   showCommand->add_option("SOURCE", show.source, sourceHelp)->required();
   showCommand->add_option("-t,--type", show.type, "Read as this type: " + KindNames());
-  showCommand->add_option_function<std::string>(
-      "--at", [](const std::string& v) { show.at = ParseNumber(v, "--at"); }, "Offset of the record in the file");
+  AddNumberOption(showCommand, "--at", &show.at, "Offset of the record in the file or slot");
+  showCommand->footer(std::string(kPackageHelp) + "--type package reads any bytes as a package header.");
   showCommand->add_flag("--no-display", show.noDisplay, "Leave out the library's own display lines");
   SetAction(showCommand, []() { RunShow(show); });
 
@@ -233,8 +250,8 @@ void RegisterRecordCommands(CLI::App& app) {
       "check", "Check a record's framing, sizes and nested entries; report the first problem's offset");
   checkCommand->add_option("SOURCE", check.source, sourceHelp)->required();
   checkCommand->add_option("-t,--type", check.type, "Check as this type: " + KindNames());
-  checkCommand->add_option_function<std::string>(
-      "--at", [](const std::string& v) { check.at = ParseNumber(v, "--at"); }, "Offset of the record in the file");
+  AddNumberOption(checkCommand, "--at", &check.at, "Offset of the record in the file or slot");
+  checkCommand->footer(std::string(kPackageHelp) + "With --type package the same rules are checked.");
   SetAction(checkCommand, []() { RunCheck(check); });
 
   CLI::App* make = record->add_subcommand("make", "Build a record from arguments");

@@ -2,10 +2,14 @@
 
 #include <sys/stat.h>
 
+#include <algorithm>
+#include <limits>
+
 #include "location_arg.h"
 #include "output.h"
 #include "record_kinds.h"
 #include "stbplat/extruder.h"
+#include "stbplat/memory_map.h"
 #include "tool.h"
 
 namespace stbtool {
@@ -31,28 +35,34 @@ unsigned int BigEndian32(const unsigned char* p) {
 }
 
 bool ReadMore(Extruder& in, std::vector<unsigned char>* bytes, unsigned int count) {
+  if (count == 0) return true;
   size_t had = bytes->size();
   bytes->resize(had + count);
   unsigned int status = in.extrude(bytes->data() + had, count);
   return status == kExtrudeOk || status == kExtrudeExhausted;
 }
 
-// The record's own bytes from a slot: its header says how many.
-std::vector<unsigned char> ReadFromLocation(const std::string& text, const LocationArg& arg) {
+// The record's own bytes from a slot: its header says how many. Nothing is
+// read past the `room` left in the slot (NOR reads there do not fail, they
+// give zero bytes).
+std::vector<unsigned char> ReadFromLocation(const std::string& text, const LocationArg& arg, unsigned long room) {
   ComponentLocation component = ToComponentLocation(arg);
   Extruder in(&component, false);
   if (!in.isInitedOK) throw Failure("cannot open location " + text);
   std::vector<unsigned char> bytes;
-  if (!ReadMore(in, &bytes, kEntryHeader)) throw Failure("cannot read location " + text);
+  auto within = [&](unsigned long n) { return static_cast<unsigned int>(std::min(n, room - bytes.size())); };
+  if (!ReadMore(in, &bytes, within(kEntryHeader))) throw Failure("cannot read location " + text);
+  if (bytes.size() < kEntryHeader) return bytes;
   unsigned int code = BigEndian32(bytes.data());
   unsigned int rest;
   if (KindByCode(code) != nullptr) {
     unsigned int size = BigEndian32(bytes.data() + 4);
-    rest = size < kLargestRecord ? size : kLargestRecord;
+    rest = within(size < kLargestRecord ? size : kLargestRecord);
   } else {
-    if (!ReadMore(in, &bytes, kPackageFixed - kEntryHeader)) throw Failure("cannot read location " + text);
+    if (!ReadMore(in, &bytes, within(kPackageFixed - kEntryHeader))) throw Failure("cannot read location " + text);
+    if (bytes.size() < kPackageFixed) return bytes;
     unsigned int count = BigEndian32(bytes.data() + kPackageCountAt);
-    rest = (count <= kMaxComponents ? count : kMaxComponents) * kComponentBytes;
+    rest = within((count <= kMaxComponents ? count : kMaxComponents) * kComponentBytes);
   }
   if (rest == 0 || ReadMore(in, &bytes, rest)) return bytes;
   // A record that runs past its slot: keep what is there, for the check to
@@ -85,9 +95,17 @@ RecordSource LoadRecordSource(const std::string& source, unsigned long offset) {
     if (arg.hasOffset) throw UsageError("give the offset of '" + source + "' once, not also with --at");
     arg.offset = offset;
   }
+  Location slot = ToComponentLocation(arg).location;
+  unsigned long slotSize = 0, slotOffset = 0, room = std::numeric_limits<unsigned long>::max();
+  if (ExtendedMemoryMapStructure::Instance()->GetSlotSizeAndOffset(&slot, &slotSize, &slotOffset)) {
+    if (arg.offset >= slotSize)
+      throw UsageError((arg.hasOffset ? "SOURCE " + source + ": offset " : "--at ") + Hex(arg.offset) +
+                       " lies past the end of the slot (" + std::to_string(slotSize) + " bytes)");
+    room = slotSize - arg.offset;
+  }
   out.isLocation = true;
   out.base = arg.offset;
-  out.bytes = ReadFromLocation(source, arg);
+  out.bytes = ReadFromLocation(source, arg, room);
   return out;
 }
 

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "actions.h"
+#include "location_arg.h"
 #include "log_sink.h"
 #include "output.h"
 #include "stbplat/display_utils.h"
@@ -33,7 +34,7 @@ void RunHexdump(const DumpArgs& args) {
     throw UsageError("hexdump: --offset " + Hex(args.offset) + " lies past the end of " +
                      args.file + " (" + std::to_string(bytes.size()) + " bytes)");
   unsigned long end = args.length == 0 ? bytes.size()
-                                       : std::min<unsigned long>(bytes.size(), args.offset + args.length);
+                                       : args.offset + std::min<unsigned long>(bytes.size() - args.offset, args.length);
   if (Options().json) {
     Json rows = Json::array();
     for (unsigned long at = args.offset; at < end; at += kDumpRow) {
@@ -123,8 +124,8 @@ void RegisterUtilCommands(CLI::App& app) {
   static DumpArgs dump;
   CLI::App* hexdump = app.add_subcommand("hexdump", "Hex dump of a file, 16 bytes a row");
   hexdump->add_option("FILE", dump.file, "File to dump; - reads standard input")->required();
-  hexdump->add_option("-s,--offset", dump.offset, "First byte to dump");
-  hexdump->add_option("-n,--length", dump.length, "Number of bytes to dump (default: to the end)");
+  AddNumberOption(hexdump, "-s,--offset", &dump.offset, "First byte to dump");
+  AddNumberOption(hexdump, "-n,--length", &dump.length, "Number of bytes to dump (default: to the end)");
   hexdump->add_option("--indent", dump.indent, "Spaces before each row")->check(CLI::Range(0, 103));
   SetAction(hexdump, []() { RunHexdump(dump); });
 
