@@ -58,6 +58,12 @@ const Row kRows[] = {
      "00000000  41 42 43 44 45 46 47 48 49 4A 4B 4C 4D 4E 4F 50      ABCDEFGHIJKLMNOP\n"
      "00000010  51 00 7F                                             Q..             \n"},
     {{"hexdump", "--offset", "100", "@/dump.bin"}, 2, kErr, "--offset 0x64"},
+    // Rows equal to the one before squeezed to one "*"; -n 0 dumps nothing.
+    {{"hexdump", "-"}, 0, kExactOut,
+     "00000000  00 00 00 00 00 00 00 00 00 00 00 00 00 00 00 00      ................\n*\n"
+     "00000030  5A" + std::string(51, ' ') + "Z" + std::string(15, ' ') + "\n",
+     std::string(48, '\0') + "Z"},
+    {{"hexdump", "-n", "0", "@/dump.bin"}, 0, kExactOut, ""},
     // Ini files: values without comments; the first bad line.
     {{"ini", "@/good.ini"}, 0, kExactOut, "top = 1\n\n[net]\naddress = 10.0.0.1\nmask = 255.0.0.0\n"},
     {{"ini", "@/bad.ini"}, 1, kErr, "@/bad.ini:3: first bad line"},

@@ -25,15 +25,25 @@ struct DumpArgs {
   std::string file;
   unsigned long offset = 0;
   unsigned long length = 0;
+  bool lengthGiven = false;  // -n 0 dumps nothing; no -n dumps to the end
+  bool allRows = false;      // no squeezing of repeated rows
   int indent = 0;
 };
+
+// A full row equal to the row before it, as hexdump -C squeezes it.
+bool RepeatsRowBefore(const std::vector<unsigned char>& bytes, unsigned long at, unsigned long end,
+                      unsigned long first) {
+  return at >= first + kDumpRow && end - at >= kDumpRow &&
+         std::equal(bytes.begin() + static_cast<long>(at), bytes.begin() + static_cast<long>(at + kDumpRow),
+                    bytes.begin() + static_cast<long>(at - kDumpRow));
+}
 
 void RunHexdump(const DumpArgs& args) {
   std::vector<unsigned char> bytes = ReadWholeFile(args.file);
   if (args.offset > bytes.size())
     throw UsageError("hexdump: --offset " + Hex(args.offset) + " lies past the end of " +
                      args.file + " (" + std::to_string(bytes.size()) + " bytes)");
-  unsigned long end = args.length == 0 ? bytes.size()
+  unsigned long end = !args.lengthGiven ? bytes.size()
                                        : args.offset + std::min<unsigned long>(bytes.size() - args.offset, args.length);
   if (Options().json) {
     Json rows = Json::array();
@@ -51,13 +61,22 @@ void RunHexdump(const DumpArgs& args) {
     return;
   }
   if (end == args.offset) {
+    if (args.lengthGiven) return;  // asked for nothing
     DisplayCapture capture(eLogModuleHWSpecific);
     DumpBuffer(eLogModuleHWSpecific, static_cast<unsigned char>(args.indent), nullptr, 0);
     std::cout << capture.Text();
     return;
   }
-  // One library call per row, so that each row can carry its offset.
+  // One library call per row, so that each row can carry its offset. A run
+  // of rows equal to the one before shows as one "*", as in hexdump -C.
+  bool squeezing = false;
   for (unsigned long at = args.offset; at < end; at += kDumpRow) {
+    if (!args.allRows && RepeatsRowBefore(bytes, at, end, args.offset)) {
+      if (!squeezing) std::cout << "*\n";
+      squeezing = true;
+      continue;
+    }
+    squeezing = false;
     unsigned int n = static_cast<unsigned int>(std::min<unsigned long>(kDumpRow, end - at));
     DisplayCapture capture(eLogModuleHWSpecific);
     DumpBuffer(eLogModuleHWSpecific, static_cast<unsigned char>(args.indent), bytes.data() + at, n);
@@ -125,7 +144,10 @@ void RegisterUtilCommands(CLI::App& app) {
   CLI::App* hexdump = app.add_subcommand("hexdump", "Hex dump of a file, 16 bytes a row");
   hexdump->add_option("FILE", dump.file, "File to dump; - reads standard input")->required();
   AddNumberOption(hexdump, "-s,--offset", &dump.offset, "First byte to dump");
-  AddNumberOption(hexdump, "-n,--length", &dump.length, "Number of bytes to dump (default: to the end)");
+  AddNumberOption(hexdump, "-n,--length", &dump.length, "Number of bytes to dump (default: to the end)",
+                  &dump.lengthGiven);
+  hexdump->add_flag("--all-rows", dump.allRows,
+                    "Show every row; by default a run of rows equal to the one before shows as one *");
   hexdump->add_option("--indent", dump.indent, "Spaces before each row")->check(CLI::Range(0, 103));
   SetAction(hexdump, []() { RunHexdump(dump); });
 
