@@ -132,6 +132,21 @@ const Row kRows[] = {
      "--length 0x100000 runs past the end of NOR0.BOOT.A (65536 bytes left)"},
     {{"--root", "@/device", "flash", "write", "NOR0.BOOT.A", "@/long.bin", "--yes"}, 2, kErr,
      "(70000 bytes) does not fit in NOR0.BOOT.A (65536 bytes left)"},
+    // Checked before anything is erased: standard input too long for the slot,
+    // a NAND offset inside a page, a NOR range of part sectors, eMMC sectors.
+    {{"--root", "@/device", "flash", "write", "NOR0.BOOT.A", "-", "--erase", "--yes"}, 2, kErr,
+     "standard input holds more than the 65536 bytes NOR0.BOOT.A has; nothing was changed", std::string(70000, 'a')},
+    {{"--root", "@/device", "flash", "write", "NAND0.KERNEL.A+0x801", "@/dump.bin", "--erase", "--yes"}, 2, kErr,
+     "NAND is written from the start of a page (0x800 bytes); the page holding the offset starts at +0x800"},
+    {{"--root", "@/device", "record", "show", "NAND0.KERNEL.A"}, 0, kOut, "kernel 5.15a"},
+    {{"--root", "@/device", "flash", "erase", "0xE0000100", "--length", "0x10000", "--yes"}, 2, kErr,
+     "0xE0000100 +0x10000 is not whole 0x10000-byte sectors (the sector holding it starts at 0xE0000000)"},
+    {{"--root", "@/device", "flash", "erase", "0xE0020000", "--length", "0x20000", "--yes"}, 2, kErr,
+     "runs past the end of its partition (0x10000 bytes left)"},
+    {{"--root", "@/device", "flash", "erase-sector", "EMMC0.APPS.B", "--yes"}, 2, kErr, "no erase sectors"},
+    // A read from a slot that is not there leaves the output file alone.
+    {{"--root", "@/device", "flash", "read", "NOR0.PANL.A", "-n", "16", "-o", "@/check.txt"}, 1, kErr, "PANL"},
+    {{"crc32", "@/check.txt"}, 0, kExactOut, "0xCBF43926  @/check.txt\n"},
     // A new front-panel text goes into its slot.
     {{"record", "make", "front-panel", "GOODBYE", "-o", "@/panel.bin"}, 0, kExactOut, ""},
     {{"--root", "@/device", "flash", "erase", "NOR0.PANEL.A", "--yes"}, 0, kErr, ""},

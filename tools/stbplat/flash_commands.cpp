@@ -51,6 +51,7 @@ struct Target {
   unsigned long room = 0;
   bool roomKnown = false;
   Medium medium = Medium::kOther;
+  unsigned long pageSize = 0;  // NAND writes start on a page
 };
 
 // What a transfer can reach: NAND transfers skip bad blocks, so a NAND
@@ -64,6 +65,7 @@ unsigned long Capacity(const MtdPartition& p) {
 // Sets the room left from offset to the end of partition p.
 void SetRoom(Target& t, const MtdPartition& p) {
   t.medium = p.medium;
+  t.pageSize = p.pageSize;
   if (t.offset > Capacity(p)) return;
   t.room = Capacity(p) - t.offset;
   t.roomKnown = true;
@@ -213,6 +215,20 @@ class CommandFile {
   CommandFile& operator=(const CommandFile&) = delete;
 
   bool IsStream() const { return !owned_; }
+  // Takes the stream into a temporary file, at most `limit` bytes, and reads
+  // from there; the file's size then tells whether more was there.
+  void Spool(unsigned long limit) {
+    FILE* spool = std::tmpfile();
+    if (spool == nullptr) throw Failure(path_ + ": no temporary file: " + std::strerror(errno));
+    std::vector<unsigned char> piece(std::min(kPiece, limit));
+    for (unsigned long done = 0, got; done < limit && (got = Read(piece.data(), std::min(kPiece, limit - done))) > 0;
+         done += got)
+      if (std::fwrite(piece.data(), 1, got, spool) != got)
+        throw Failure(path_ + ": temporary file: " + std::strerror(errno));
+    std::rewind(spool);
+    file_ = spool;
+    owned_ = true;
+  }
   // Size of a regular file; false for standard input and pipes.
   bool Size(unsigned long* size) const {
     struct stat info;
@@ -323,8 +339,9 @@ void RunRead(const TransferArgs& args) {
   std::string output = args.file.empty() ? "-" : args.file;
   if (output == "-" && isatty(STDOUT_FILENO))
     throw UsageError("flash read: give -o FILE (standard output is a terminal)");
-  CommandFile sink(output, true);
+  // The target first: a target that does not open leaves the output file as it was.
   TargetStream in(t, false);
+  CommandFile sink(output, true);
   std::vector<unsigned char> piece(std::min(kPiece, length));
   Progress progress("reading " + t.text, length);
   for (unsigned long done = 0; done < length;) {
@@ -375,9 +392,20 @@ void EraseSlotOf(const Target& t, const std::string& command) {
 
 void RunWrite(const TransferArgs& args) {
   Target t = ParseTarget(args.target, args.mtd, "flash write");
+  if (t.medium == Medium::kNand && t.pageSize != 0 && t.offset % t.pageSize != 0)
+    throw UsageError("flash write: " + t.text + ": NAND is written from the start of a page (" +
+                     Hex(t.pageSize) + " bytes); the page holding the offset starts at +" +
+                     Hex(t.offset - t.offset % t.pageSize));
   CommandFile input(args.file, false);
+  // Before an erase the whole input must be known to fit: standard input is
+  // taken into a temporary file first, no further than the room it has.
+  const bool spooled = args.erase && input.IsStream() && t.roomKnown;
+  if (spooled) input.Spool(t.room + 1);
   unsigned long size = 0;
   bool sized = input.Size(&size);
+  if (spooled && size > t.room)
+    throw UsageError("flash write: standard input holds more than the " + std::to_string(t.room) +
+                     " bytes " + t.text + " has; nothing was changed");
   if (sized && t.roomKnown && size > t.room)
     throw UsageError("flash write: " + args.file + " (" + std::to_string(size) + " bytes) does not fit in " +
                      t.text + " (" + std::to_string(t.room) + " bytes left)");
@@ -398,19 +426,59 @@ struct EraseArgs {
   bool hasLength = false;
 };
 
+// An erase by NOR address covers whole sectors of one partition; the
+// library would round a part sector up, and erase nothing (yet report it
+// erased) for a range that leaves its partition.
+void CheckNorEraseRange(const std::string& command, unsigned long address, unsigned long length) {
+  FlashInterface* flash = FlashInterface::Instance();
+  const unsigned long sector = flash->GetNORSectorSize();
+  unsigned long offset = 0;
+  const char* path = flash->LookupMTDPartition(address, &offset);
+  if (path == nullptr) throw UsageError(command + ": " + Hex(address) + " lies in no NOR partition");
+  if (sector == 0 || address % sector != 0 || length % sector != 0 || length == 0)
+    throw UsageError(command + ": " + Hex(address) + " +" + Hex(length) + " is not whole " + Hex(sector) +
+                     "-byte sectors (the sector holding it starts at " + Hex(address - address % sector) + ")");
+  const unsigned long size = flash->GetDevSize(path);
+  if (offset + length > size)
+    throw UsageError(command + ": " + Hex(address) + " +" + Hex(length) + " runs past the end of its partition " +
+                     "(" + Hex(size - offset) + " bytes left)");
+}
+
+// The NOR erase reports no failure of its own: read the range back.
+void CheckErased(const std::string& command, unsigned long address, unsigned long length) {
+  FlashInterface* flash = FlashInterface::Instance();
+  std::vector<unsigned char> piece(std::min(kPiece, length));
+  for (unsigned long done = 0; done < length;) {
+    const unsigned long n = std::min(kPiece, length - done);
+    if (!flash->ReadFromNORFlashAtAddr(address + done, piece.data(), n))
+      throw Failure(command + ": reading back " + Hex(address + done) + " failed; the range may not be erased");
+    const auto left = std::find_if(piece.begin(), piece.begin() + static_cast<long>(n),
+                                   [](unsigned char b) { return b != kErasedByte; });
+    if (left != piece.begin() + static_cast<long>(n))
+      throw Failure(command + ": " + Hex(address + done + static_cast<unsigned long>(left - piece.begin())) +
+                    " is not erased after the erase");
+    done += n;
+  }
+}
+
 void RunErase(const EraseArgs& args, bool sectorOnly) {
   const std::string command = sectorOnly ? "flash erase-sector" : "flash erase";
   Target t = ParseTarget(args.target, false, command);
-  RequireYes(args.yes, command, t);
   FlashInterface* flash = FlashInterface::Instance();
+  if (t.form == TargetForm::kNorAddress) {
+    if (!sectorOnly && !args.hasLength) throw UsageError(command + ": give --length to erase by address");
+    CheckNorEraseRange(command, t.address, sectorOnly ? flash->GetNORSectorSize() : args.length);
+  } else if (sectorOnly) {
+    Location location = LocationOf(t.location);
+    if (ExtendedMemoryMapStructure::Instance()->IsEMMCDevice(&location))
+      throw UsageError(command + ": " + t.text + " is on eMMC, which has no erase sectors; use flash erase");
+  }
+  RequireYes(args.yes, command, t);
   bool ok = false;
   if (t.form == TargetForm::kNorAddress) {
-    if (sectorOnly) {
-      ok = flash->EraseNORSector(t.address);
-    } else {
-      if (!args.hasLength) throw UsageError(command + ": give --length to erase by address");
-      ok = flash->NORErase(t.address, args.length);
-    }
+    const unsigned long length = sectorOnly ? flash->GetNORSectorSize() : args.length;
+    ok = sectorOnly ? flash->EraseNORSector(t.address) : flash->NORErase(t.address, length);
+    if (ok) CheckErased(command, t.address, length);
   } else {
     if (t.location.hasOffset) throw UsageError(command + ": " + t.text + ": slots are erased whole, without an offset");
     Location location = LocationOf(t.location);
