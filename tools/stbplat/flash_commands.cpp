@@ -37,6 +37,8 @@ namespace {
 constexpr unsigned long kPiece = 1024 * 1024;
 // What an erased eMMC slot holds, as erased flash does.
 constexpr unsigned char kErasedByte = 0xFF;
+// The memory map's technology of NOR devices.
+constexpr char kNorTechnology[] = "SPI_NOR.";
 
 enum class TargetForm { kLocation, kMtd, kNorAddress };
 
@@ -136,6 +138,17 @@ class TargetStream {
  public:
   TargetStream(const Target& t, bool writing) : t_(t), component_(ToComponentLocation(t.location)) {
     if (t.form != TargetForm::kLocation) return;
+    // A NOR slot by its address: the NOR stream would not report a failed
+    // flash call, the calls by address do.
+    ExtendedMemoryMapStructure* map = ExtendedMemoryMapStructure::Instance();
+    const MemoryDeviceEntry* device = map->GetDevice(&component_.location);
+    if (device != nullptr && std::memcmp(device->technology, kNorTechnology, kMemoryMapNameWidth) == 0 &&
+        !map->IsSlotAFile(&component_.location)) {
+      if (!map->GetPhysAddressFromLocation(&component_.location, t.offset, &norAddress_, nullptr))
+        throw Failure(std::string(writing ? "flash write" : "flash read") + ": cannot open " + t.text);
+      byAddress_ = true;
+      return;
+    }
     if (writing) {
       out_.reset(new Intruder(&component_));
       if (!out_->isInitedOK) throw Failure("flash write: cannot open " + t.text);
@@ -153,6 +166,8 @@ class TargetStream {
     if (in_) {
       unsigned int status = in_->extrude(data, static_cast<unsigned int>(n));
       ok = status == kExtrudeOk || status == kExtrudeExhausted;
+    } else if (byAddress_) {
+      ok = flash_->ReadFromNORFlashAtAddr(norAddress_ + done_, data, n);
     } else if (t_.form == TargetForm::kNorAddress) {
       ok = flash_->ReadFromNORFlashAtAddr(Position(), data, n);
     } else if (t_.medium == Medium::kNand) {
@@ -171,6 +186,8 @@ class TargetStream {
     if (out_) {
       unsigned int status = out_->intrude(data, static_cast<unsigned int>(n));
       ok = status == kIntrudeOk || status == kIntrudeFull;
+    } else if (byAddress_) {
+      ok = flash_->WriteToNORFlashAtAddr(norAddress_ + done_, data, n);
     } else if (t_.form == TargetForm::kNorAddress) {
       ok = flash_->WriteToNORFlashAtAddr(Position(), data, n);
     } else if (t_.medium == Medium::kNand) {
@@ -193,6 +210,8 @@ class TargetStream {
   FlashInterface* flash_ = FlashInterface::Instance();
   std::unique_ptr<Extruder> in_;
   std::unique_ptr<Intruder> out_;
+  bool byAddress_ = false;
+  unsigned long norAddress_ = 0;
   unsigned long done_ = 0;
 };
 
