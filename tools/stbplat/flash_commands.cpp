@@ -149,6 +149,13 @@ class TargetStream {
       byAddress_ = true;
       return;
     }
+    // A NAND slot through the calls by location, which report failures;
+    // the stream's last partial page would go out through a flush that
+    // reports nothing.
+    if (map->IsNandDevice(&component_.location) && !map->IsSlotAFile(&component_.location)) {
+      nandByLocation_ = true;
+      return;
+    }
     if (writing) {
       out_.reset(new Intruder(&component_));
       if (!out_->isInitedOK) throw Failure("flash write: cannot open " + t.text);
@@ -168,6 +175,8 @@ class TargetStream {
       ok = status == kExtrudeOk || status == kExtrudeExhausted;
     } else if (byAddress_) {
       ok = flash_->ReadFromNORFlashAtAddr(norAddress_ + done_, data, n);
+    } else if (nandByLocation_) {
+      ok = flash_->NANDRead(data, n, &component_.location, t_.offset + done_);
     } else if (t_.form == TargetForm::kNorAddress) {
       ok = flash_->ReadFromNORFlashAtAddr(Position(), data, n);
     } else if (t_.medium == Medium::kNand) {
@@ -188,10 +197,10 @@ class TargetStream {
       ok = status == kIntrudeOk || status == kIntrudeFull;
     } else if (byAddress_) {
       ok = flash_->WriteToNORFlashAtAddr(norAddress_ + done_, data, n);
+    } else if (nandByLocation_ || t_.medium == Medium::kNand) {
+      ok = WriteNandPages(data, n);
     } else if (t_.form == TargetForm::kNorAddress) {
       ok = flash_->WriteToNORFlashAtAddr(Position(), data, n);
-    } else if (t_.medium == Medium::kNand) {
-      ok = flash_->NANDWrite(data, n, t_.mtdName.c_str(), Position());
     } else {
       unsigned long base = 0;
       const char* path = flash_->LookupMTDPartition(t_.mtdName.c_str(), &base);
@@ -201,16 +210,41 @@ class TargetStream {
     return ok;
   }
 
-  // NAND keeps a last partial page back until told to write it.
-  void Flush() { flash_->NANDFlushWrite(); }
+  // Whether bytes move through the library's calls by offset (not a stream),
+  // so that Skip can place a read anywhere.
+  bool ReadsByCall() const { return !in_ && !out_; }
+  void Skip(unsigned long n) { done_ += n; }
+
+  // The stream's NAND writes keep a last partial page back until told to
+  // write it.
+  void Flush() {
+    if (out_) flash_->NANDFlushWrite();
+  }
 
  private:
+  // NAND in whole pages: a last partial page goes out padded with erased
+  // bytes, which programming leaves as they are, so the call that writes it
+  // reports on it too.
+  bool WriteNandPages(const unsigned char* data, unsigned long n) {
+    const unsigned long page = flash_->nandPageSize != 0 ? flash_->nandPageSize : 1;
+    std::vector<unsigned char> padded;
+    if (n % page != 0) {
+      padded.assign(data, data + n);
+      padded.resize(n + page - n % page, kErasedByte);
+      data = padded.data();
+      n = padded.size();
+    }
+    if (nandByLocation_) return flash_->NANDWrite(data, n, &component_.location, t_.offset + done_);
+    return flash_->NANDWrite(data, n, t_.mtdName.c_str(), Position());
+  }
+
   const Target& t_;
   ComponentLocation component_;
   FlashInterface* flash_ = FlashInterface::Instance();
   std::unique_ptr<Extruder> in_;
   std::unique_ptr<Intruder> out_;
   bool byAddress_ = false;
+  bool nandByLocation_ = false;
   unsigned long norAddress_ = 0;
   unsigned long done_ = 0;
 };
@@ -299,8 +333,30 @@ void VerifyPiece(TargetStream& back, const unsigned char* expected, unsigned lon
 // Streams the input into the target piece by piece; with verify, reads it
 // back: a file in a second pass once everything is written, standard input
 // (which cannot be read twice) piece by piece as it lands.
+// What a failed write leaves: the piece is read back to find the first byte
+// that is not what was written, and the message says what the target holds
+// now.
+Failure WriteFailure(const Target& t, const unsigned char* piece, unsigned long n, unsigned long before,
+                     bool erased) {
+  unsigned long good = 0;
+  try {
+    TargetStream back(t, false);
+    std::vector<unsigned char> scratch(n);
+    if (back.ReadsByCall()) {
+      back.Skip(before);
+      if (back.Read(scratch.data(), n)) good = FirstDifference(piece, scratch.data(), n);
+    }
+  } catch (const Failure&) {
+    // Not readable back: the piece's start is all that is known.
+  }
+  const unsigned long start = (t.form == TargetForm::kNorAddress ? t.address : t.offset) + before + good;
+  return Failure("flash write: " + t.text + ": writing failed at " + Hex(start) + "; the first " +
+                 Hex(before + good) + " bytes are written, the rest " +
+                 (erased ? "of the slot is erased" : "is as it was"));
+}
+
 unsigned long WriteFromFile(const Target& t, CommandFile& input, const std::string& name, bool verify,
-                            unsigned long total) {
+                            unsigned long total, bool erased) {
   std::vector<unsigned char> piece(kPiece), scratch(verify ? kPiece : 0);
   TargetStream out(t, true);
   std::unique_ptr<TargetStream> back;
@@ -311,7 +367,7 @@ unsigned long WriteFromFile(const Target& t, CommandFile& input, const std::stri
     if (t.roomKnown && done + got > t.room)
       throw Failure("flash write: " + name + " does not fit in " + t.text + " (" + std::to_string(t.room) +
                     " bytes left)");
-    if (!out.Write(piece.data(), got)) throw Failure("flash write: " + t.text + ": writing failed at " + Hex(out.Position()));
+    if (!out.Write(piece.data(), got)) throw WriteFailure(t, piece.data(), got, done, erased);
     if (back) {
       out.Flush();
       VerifyPiece(*back, piece.data(), got, scratch, t, name);
@@ -433,7 +489,7 @@ void RunWrite(const TransferArgs& args) {
     if (t.form == TargetForm::kNorAddress) throw UsageError("flash write --erase: erase by address with flash erase");
     EraseSlotOf(t, "flash write --erase");
   }
-  unsigned long written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0);
+  unsigned long written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0, args.erase);
   if (!Options().json)
     std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << "\n";
 }
