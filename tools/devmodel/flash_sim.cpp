@@ -347,6 +347,7 @@ DeviceNode* FlashSim::AddPartition(int number, const std::string& name, const st
   node->storage = MakeWindowStorage(*chip->storage, offset, size);
   node->chip = chip;
   node->badBlocks = chip->badBlocks;
+  node->eccFailures = chip->eccFailures;
   node->chipOffset = chip->chipOffset + offset;
   node->LoadBadBlocks();
   nodes_["/dev/mtd" + std::to_string(number)] = node;
@@ -441,7 +442,7 @@ bool FlashSim::IsBad(const std::string& path, uint64_t offset) const {
 
 void FlashSim::AddEccFailure(const std::string& path, uint64_t offset) {
   Node* node = Find(path);
-  if (node != nullptr) node->eccFailures.insert(offset);
+  if (node != nullptr) node->AddEccFailure(offset);
 }
 
 void FlashSim::FailWritesAt(const std::string& path, uint64_t offset) {

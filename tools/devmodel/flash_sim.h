@@ -75,7 +75,8 @@ class FlashSim {
   void Poke(const std::string& path, uint64_t offset, const std::vector<uint8_t>& data);
   void MarkBad(const std::string& path, uint64_t offset);
   bool IsBad(const std::string& path, uint64_t offset) const;
-  // Every read touching the page that holds offset fails its ECC checks.
+  // Every read touching the page that holds offset fails its ECC checks
+  // until the page's block is erased.
   void AddEccFailure(const std::string& path, uint64_t offset);
   // Writes covering offset program up to the end of its page, then fail
   // with EIO (a weak page), until cleared.
