@@ -9,7 +9,11 @@
 #include <mtd/mtd-user.h>
 #include <sys/ioctl.h>
 
+#include <unistd.h>
+
 #include <cerrno>
+#include <cstdlib>
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -146,9 +150,12 @@ TEST_F(HostModeTest, OtherPathsLieUnderTheRootOrPassThrough) {
   EXPECT_EQ(2, Sys().write(fd, "abcd", 4));
   Sys().close(fd);
 
+  // A node the device lacks is not made by a write.
   errno = 0;
-  EXPECT_EQ(-1, Sys().open("/dev/mtd9", O_RDONLY, 0));
+  EXPECT_EQ(-1, Sys().open("/dev/mtd9", O_RDWR | O_CREAT, 0644));
   EXPECT_EQ(ENOENT, errno);
+  EXPECT_EQ(nullptr, Sys().fopen64("/dev/mtd9", "w"));
+  EXPECT_FALSE(std::filesystem::exists(dir / "dev/mtd9"));
   EXPECT_EQ(nullptr, Sys().popen("true", "r"));
   FILE* file = Sys().fopen64(dir.Write("outside.txt", "plain file").c_str(), "r");
   ASSERT_NE(nullptr, file);
@@ -157,6 +164,27 @@ TEST_F(HostModeTest, OtherPathsLieUnderTheRootOrPassThrough) {
   stbplat::hostsim::Detach();
   EXPECT_FALSE(stbplat::hostsim::IsAttached());
   EXPECT_EQ(stbplat::os::LibcSysCalls().open, Sys().open);
+}
+
+// Images the user may not write are read, and every change fails as on a
+// write-protected chip. Root may write anything: a root run drops to another
+// user, in a child.
+TEST_F(HostModeTest, ImagesTheUserMayNotWriteAreWriteProtected) {
+  ASSERT_EQ(0, std::system(("chmod -R a-w " + dir / "dev" + " && chmod a+rx " + dir.path()).c_str()));
+  EXPECT_EXIT(
+      {
+        if (geteuid() == 0 && setuid(65534) != 0) std::_Exit(2);
+        std::string error;
+        bool ok = stbplat::hostsim::Attach(dir.path(), &error) &&
+                  ReadAt("/dev/mtd3", 0, 4) == ReadAt("/dev/mtd2", 0x1000, 4);
+        int fd = OpenAt("/dev/mtd3", 0);
+        ok = ok && Sys().write(fd, nand.data(), kPage) == -1 && errno == EROFS;
+        ok = ok && Request("/dev/mtd4", MEMSETBADBLOCK, 0) == -1 && errno == EROFS;
+        std::fprintf(stderr, "%s\n", error.c_str());
+        std::_Exit(ok ? 0 : 1);
+      },
+      ::testing::ExitedWithCode(0), "");
+  ASSERT_EQ(0, std::system(("chmod -R u+w " + dir / "dev").c_str()));
 }
 
 TEST(HostModeAttach, ReportsWhichFileIsWrong) {

@@ -71,7 +71,8 @@ int DeviceNode::Read(uint64_t offset, void* buffer, size_t count, size_t* done) 
 }
 
 void DeviceNode::CheckReprogram(uint64_t page, const uint8_t* cells, const uint8_t* data) {
-  if (!AllErased(cells, writeSize) && !AllErased(data, writeSize) && !std::equal(cells, cells + writeSize, data))
+  if (!AllErased(cells, writeSize) && !AllErased(data, writeSize) &&
+      !std::equal(cells, cells + writeSize, data))
     AddEccFailure(page);
 }
 
@@ -94,6 +95,7 @@ int DeviceNode::Program(uint64_t offset, const uint8_t* data, size_t count) {
 
 int DeviceNode::Write(uint64_t offset, const void* data, size_t count, size_t* done) {
   *done = 0;
+  if (storage->ReadOnly()) return EROFS;
   if (kind == SimKind::kFile) {
     if (offset + count > Size())
       if (int error = storage->Resize(offset + count)) return error;
@@ -129,6 +131,7 @@ int DeviceNode::Write(uint64_t offset, const void* data, size_t count, size_t* d
 
 int DeviceNode::Erase(uint64_t start, uint64_t length) {
   if (start >= Size() || length > Size() - start) return EINVAL;
+  if (storage->ReadOnly()) return EROFS;
   if (length == 0) return 0;
   if (eraseSize == 0 || start % eraseSize != 0 || length % eraseSize != 0) return EINVAL;
   // Block by block: the blocks before a bad one are erased.
@@ -159,6 +162,7 @@ int DeviceNode::GetBadBlock(uint64_t offset, bool* bad) const {
 int DeviceNode::SetBadBlock(uint64_t offset) {
   if (kind != SimKind::kNand) return EOPNOTSUPP;
   if (offset >= Size()) return EINVAL;
+  if (storage->ReadOnly()) return EROFS;
   // The kernel erases the block before it writes the marker.
   if (int error = EraseBlock(BlockOf(offset))) return error;
   AddBad(offset, true);
@@ -171,6 +175,7 @@ mtd_info_user DeviceNode::Info() const {
   info.flags = kind == SimKind::kNand  ? MTD_CAP_NANDFLASH
                : kind == SimKind::kNor ? MTD_CAP_NORFLASH
                                        : MTD_CAP_RAM;
+  if (readOnly || storage->ReadOnly()) info.flags &= ~MTD_WRITEABLE;
   info.size = static_cast<__u32>(Size());
   info.erasesize = eraseSize;
   info.writesize = writeSize;

@@ -23,6 +23,11 @@
 //   read itself succeeds, and ECCGETSTATS' failed counter grows by one per
 //   256-byte ECC step of the page on every read touching it. Partitions of
 //   one chip share its failing pages; an erase clears them.
+// - A store that cannot be written (a device root's image the user may not
+//   write) is a write-protected chip: opens go on as before (the library
+//   opens nodes for writing just to ask MEMGETINFO), and writes, erases and
+//   bad-block marks fail with EROFS, the MTD layer's answer for a partition
+//   without MTD_WRITEABLE.
 // - ECCGETSTATS' bad-block count starts at the bad blocks the node holds and
 //   grows with every successful MEMSETBADBLOCK, a block marked twice counting
 //   twice.

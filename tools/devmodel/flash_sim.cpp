@@ -154,7 +154,12 @@ FILE* SimFopen(const char* path, const char* mode) {
     FlashSim::Node* node = sim->Find(name);
     if (node == nullptr && sim->PassesThrough()) {
       delete cookie;
-      return Libc().fopen64(sim->HostPath(path).c_str(), mode);
+      std::string host = sim->HostPath(path);
+      if (create && host != name && access(host.c_str(), F_OK) != 0) {
+        errno = ENOENT;  // nothing is created in the device's own trees
+        return nullptr;
+      }
+      return Libc().fopen64(host.c_str(), mode);
     }
     if (node == nullptr && !create) {
       delete cookie;
@@ -491,7 +496,11 @@ int FlashSim::Open(const char* path, int flags, mode_t mode) {
   std::string name(path);
   Node* node = Find(name);
   bool devMem = name == kDevMemPath && !(PassesThrough() && memory_.empty());
-  if (node == nullptr && !devMem && PassesThrough()) return Libc().open(HostPath(path).c_str(), flags, mode);
+  if (node == nullptr && !devMem && PassesThrough()) {
+    std::string host = HostPath(path);
+    if (host != name) flags &= ~O_CREAT;  // nothing is created in the device's own trees
+    return Libc().open(host.c_str(), flags, mode);
+  }
   auto handle = std::make_unique<Handle>();
   if (devMem) {
     handle->devMem = true;

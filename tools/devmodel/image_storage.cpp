@@ -28,8 +28,8 @@ std::string BadListPath(const std::string& imagePath) { return imagePath + ".bad
 
 class ImageStorage : public SimStorage {
  public:
-  ImageStorage(int fd, const std::string& path, const Geometry& geometry, bool hasOob)
-      : fd_(fd), path_(path), geometry_(geometry), hasOob_(hasOob) {}
+  ImageStorage(int fd, const std::string& path, const Geometry& geometry, bool hasOob, bool readOnly)
+      : fd_(fd), path_(path), geometry_(geometry), hasOob_(hasOob), readOnly_(readOnly) {}
   ~ImageStorage() override { close(fd_); }
   ImageStorage(const ImageStorage&) = delete;
   ImageStorage& operator=(const ImageStorage&) = delete;
@@ -50,6 +50,7 @@ class ImageStorage : public SimStorage {
   int Erase(uint64_t offset, uint64_t length) override;
   std::vector<uint64_t> BadBlocks() const override { return {bad_.begin(), bad_.end()}; }
   int SaveBadBlock(uint64_t offset) override;
+  bool ReadOnly() const override { return readOnly_; }
 
  private:
   uint64_t FileOffset(uint64_t dataOffset) const {
@@ -67,6 +68,7 @@ class ImageStorage : public SimStorage {
   std::string path_;
   Geometry geometry_;
   bool hasOob_;
+  bool readOnly_;
   std::set<uint64_t> bad_;  // block start offsets
 };
 
@@ -180,7 +182,10 @@ std::string ExpectedSizes(const Geometry& g, uint64_t fileSize) {
 
 std::unique_ptr<SimStorage> OpenImageStorage(const std::string& path, const Geometry& geometry,
                                              std::string* error) {
+  // An image the user may not write (or on a read-only mount) is still read.
   int fd = open(path.c_str(), O_RDWR | O_CLOEXEC);
+  bool readOnly = fd < 0 && (errno == EACCES || errno == EPERM || errno == EROFS);
+  if (readOnly) fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
   struct stat info;
   if (fd < 0 || fstat(fd, &info) != 0) {
     *error = path + ": " + std::strerror(errno);
@@ -195,7 +200,7 @@ std::unique_ptr<SimStorage> OpenImageStorage(const std::string& path, const Geom
     close(fd);
     return nullptr;
   }
-  auto image = std::make_unique<ImageStorage>(fd, path, geometry, withOob);
+  auto image = std::make_unique<ImageStorage>(fd, path, geometry, withOob, readOnly);
   if (!image->LoadBadBlocks(error)) return nullptr;
   return image;
 }

@@ -30,7 +30,8 @@ struct Geometry {
   uint64_t oobSize = 0;    // OOB bytes per page when the image holds them
 };
 
-// Opens path read-write. The file's size decides whether a NAND image holds
+// Opens path read-write, or read-only when it may not be written: the node
+// over it is then write-protected (device_node.h). The file's size decides whether a NAND image holds
 // OOB bytes; any other size is refused. The bad-block markers or list are
 // read once here: the library asks for every block from the start of the
 // device for each block it touches. On failure returns null and says why.
