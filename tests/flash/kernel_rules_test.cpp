@@ -63,6 +63,17 @@ TEST_F(KernelRulesTest, WritesClearBitsLandInBadBlocksAndAreCutAtTheEnd) {
   ASSERT_EQ(WriteAt(0, Bytes(kNandPage, 0xF0)), kPage);
   ASSERT_EQ(WriteAt(0, Bytes(kNandPage, 0x3C)), kPage);
   EXPECT_EQ(sim_.Bytes(kNode, 0, kNandPage), Bytes(kNandPage, 0x30));
+  // Programmed again with other data, the page fails ECC until its block
+  // is erased; the same data or all 0xFF again changes nothing.
+  Bytes page(kNandPage);
+  for (const Bytes& again : {Pattern(kNandPage, 4), Pattern(kNandPage, 4), Bytes(kNandPage, 0xFF)})
+    ASSERT_EQ(WriteAt(kNandPage, again), kPage);
+  ASSERT_EQ(ReadAt(0, page) + ReadAt(kNandPage, page), 2 * kPage);
+  EXPECT_EQ(page, Pattern(kNandPage, 4));
+  EXPECT_EQ(Stats().failed, kNandPage / 256);  // page 0's steps
+  ASSERT_EQ(Request(MEMERASE, 0, kNandBlock), 0);
+  ASSERT_EQ(ReadAt(0, page), kPage);
+  EXPECT_EQ(Stats().failed, kNandPage / 256);
   // Only erases consult the bad-block table.
   ASSERT_EQ(Request(MEMSETBADBLOCK, 2 * kNandBlock), 0);
   EXPECT_EQ(WriteAt(2 * kNandBlock + kNandPage, Pattern(kNandPage, 8)), kPage);

@@ -19,6 +19,10 @@ constexpr uint32_t kSeedStep = 0x9E3779B9u;
 constexpr uint32_t kLcgMultiplier = 1103515245u;
 constexpr uint32_t kLcgIncrement = 12345u;
 
+bool AllErased(const uint8_t* bytes, size_t n) {
+  return std::all_of(bytes, bytes + n, [](uint8_t b) { return b == kErasedByte; });
+}
+
 }  // namespace
 
 bool DeviceNode::IsBadBlock(uint64_t offset) const {
@@ -41,10 +45,10 @@ void DeviceNode::LoadBadBlocks() {
 void DeviceNode::ScrambleFailedPages(uint64_t offset, size_t n, uint8_t* bytes) {
   // The driver reads whole pages: a failing page counts once per ECC step
   // however little of it was asked for, and its bytes come back scrambled.
-  std::set<uint64_t> failedPages;
-  for (uint64_t failure : eccFailures)
-    if (PageOf(failure) < offset + n && PageOf(failure) + writeSize > offset) failedPages.insert(PageOf(failure));
-  for (uint64_t page : failedPages) {
+  auto first = eccFailures->lower_bound(chipOffset + PageOf(offset));
+  auto end = eccFailures->lower_bound(chipOffset + offset + n);
+  for (auto it = first; it != end; ++it) {
+    uint64_t page = *it - chipOffset;
     eccFailed += std::max<uint32_t>(1, writeSize / kEccStep);
     uint32_t state = static_cast<uint32_t>(page) ^ (++garbageReads * kSeedStep);
     uint64_t to = std::min<uint64_t>(page + writeSize, offset + n);
@@ -61,17 +65,27 @@ int DeviceNode::Read(uint64_t offset, void* buffer, size_t count, size_t* done) 
   if (offset >= Size()) return 0;
   size_t n = static_cast<size_t>(std::min<uint64_t>(count, Size() - offset));
   if (int error = storage->Read(offset, buffer, n)) return error;
-  if (!eccFailures.empty()) ScrambleFailedPages(offset, n, static_cast<uint8_t*>(buffer));
+  if (!eccFailures->empty()) ScrambleFailedPages(offset, n, static_cast<uint8_t*>(buffer));
   *done = n;
   return 0;
 }
 
-// Flash cells only go from 1 to 0.
+void DeviceNode::CheckReprogram(uint64_t page, const uint8_t* cells, const uint8_t* data) {
+  if (!AllErased(cells, writeSize) && !AllErased(data, writeSize) &&
+      !std::equal(cells, cells + writeSize, data))
+    AddEccFailure(page);
+}
+
+// Flash cells only go from 1 to 0. NAND is programmed in whole pages (the
+// caller has checked that offset and count are).
 int DeviceNode::Program(uint64_t offset, const uint8_t* data, size_t count) {
-  std::vector<uint8_t> cells(std::min(count, kProgramPiece));
+  size_t unit = kind == SimKind::kNand ? writeSize : 1;
+  std::vector<uint8_t> cells(std::min(count, std::max<size_t>(kProgramPiece / unit, 1) * unit));
   for (size_t done = 0; done < count;) {
     size_t n = std::min(cells.size(), count - done);
     if (int error = storage->Read(offset + done, cells.data(), n)) return error;
+    if (kind == SimKind::kNand)
+      for (size_t at = 0; at < n; at += unit) CheckReprogram(offset + done + at, &cells[at], data + done + at);
     for (size_t i = 0; i < n; ++i) cells[i] &= data[done + i];
     if (int error = storage->Write(offset + done, cells.data(), n)) return error;
     done += n;
@@ -81,6 +95,7 @@ int DeviceNode::Program(uint64_t offset, const uint8_t* data, size_t count) {
 
 int DeviceNode::Write(uint64_t offset, const void* data, size_t count, size_t* done) {
   *done = 0;
+  if (storage->ReadOnly()) return EROFS;
   if (kind == SimKind::kFile) {
     if (offset + count > Size())
       if (int error = storage->Resize(offset + count)) return error;
@@ -116,6 +131,7 @@ int DeviceNode::Write(uint64_t offset, const void* data, size_t count, size_t* d
 
 int DeviceNode::Erase(uint64_t start, uint64_t length) {
   if (start >= Size() || length > Size() - start) return EINVAL;
+  if (storage->ReadOnly()) return EROFS;
   if (length == 0) return 0;
   if (eraseSize == 0 || start % eraseSize != 0 || length % eraseSize != 0) return EINVAL;
   // Block by block: the blocks before a bad one are erased.
@@ -124,9 +140,16 @@ int DeviceNode::Erase(uint64_t start, uint64_t length) {
       if (block > start && recordHistory) erases.emplace_back(start, block - start);
       return EIO;
     }
-    if (int error = storage->Erase(block, eraseSize)) return error;
+    if (int error = EraseBlock(block)) return error;
   }
   if (recordHistory) erases.emplace_back(start, length);
+  return 0;
+}
+
+int DeviceNode::EraseBlock(uint64_t block) {
+  if (int error = storage->Erase(block, eraseSize)) return error;
+  eccFailures->erase(eccFailures->lower_bound(chipOffset + block),
+                     eccFailures->lower_bound(chipOffset + block + eraseSize));
   return 0;
 }
 
@@ -139,8 +162,9 @@ int DeviceNode::GetBadBlock(uint64_t offset, bool* bad) const {
 int DeviceNode::SetBadBlock(uint64_t offset) {
   if (kind != SimKind::kNand) return EOPNOTSUPP;
   if (offset >= Size()) return EINVAL;
+  if (storage->ReadOnly()) return EROFS;
   // The kernel erases the block before it writes the marker.
-  if (int error = storage->Erase(BlockOf(offset), eraseSize)) return error;
+  if (int error = EraseBlock(BlockOf(offset))) return error;
   AddBad(offset, true);
   return storage->SaveBadBlock(BlockOf(offset));
 }
@@ -151,6 +175,7 @@ mtd_info_user DeviceNode::Info() const {
   info.flags = kind == SimKind::kNand  ? MTD_CAP_NANDFLASH
                : kind == SimKind::kNor ? MTD_CAP_NORFLASH
                                        : MTD_CAP_RAM;
+  if (readOnly || storage->ReadOnly()) info.flags &= ~MTD_WRITEABLE;
   info.size = static_cast<__u32>(Size());
   info.erasesize = eraseSize;
   info.writesize = writeSize;

@@ -8,7 +8,10 @@
 // - RAM (an MTD over a block device, as block2mtd makes): writes replace
 //   bytes; MEMGETINFO says MTD_RAM.
 // - NAND: writes start on a page and are whole pages (EINVAL otherwise);
-//   programming a written page clears bits (AND); a block marked bad still
+//   programming a written page clears bits (AND), and when the page was not
+//   erased and the new data differs (all 0xFF excepted, which programs
+//   nothing) its stored ECC no longer matches: the page fails ECC until its
+//   block is erased, as on nandsim; a block marked bad still
 //   takes writes (only erases look at the bad-block table); MEMSETBADBLOCK
 //   erases the block before it marks it; a weak page fails the write with
 //   EIO after the pages before it and the weak page itself were programmed.
@@ -18,7 +21,13 @@
 //   one stops the erase with EIO after the good blocks before it.
 // - A page with an ECC failure reads back scrambled (every byte differs), the
 //   read itself succeeds, and ECCGETSTATS' failed counter grows by one per
-//   256-byte ECC step of the page on every read touching it.
+//   256-byte ECC step of the page on every read touching it. Partitions of
+//   one chip share its failing pages; an erase clears them.
+// - A store that cannot be written (a device root's image the user may not
+//   write) is a write-protected chip: opens go on as before (the library
+//   opens nodes for writing just to ask MEMGETINFO), and writes, erases and
+//   bad-block marks fail with EROFS, the MTD layer's answer for a partition
+//   without MTD_WRITEABLE.
 // - ECCGETSTATS' bad-block count starts at the bad blocks the node holds and
 //   grows with every successful MEMSETBADBLOCK, a block marked twice counting
 //   twice.
@@ -55,7 +64,8 @@ struct DeviceNode {
   std::shared_ptr<std::set<uint64_t>> badBlocks = std::make_shared<std::set<uint64_t>>();
   uint64_t chipOffset = 0;
   bool readOnly = false;
-  std::set<uint64_t> eccFailures;
+  // Chip offsets of the pages that fail ECC, shared like badBlocks.
+  std::shared_ptr<std::set<uint64_t>> eccFailures = std::make_shared<std::set<uint64_t>>();
   std::set<uint64_t> weakOffsets;
   uint32_t eccFailed = 0;
   uint32_t badBlockCount = 0;
@@ -75,6 +85,9 @@ struct DeviceNode {
   // Takes the bad blocks inside the node's range from the table its store
   // or chip holds, and counts them.
   void LoadBadBlocks();
+  // Every read touching the page that holds offset fails ECC until the
+  // page's block is erased.
+  void AddEccFailure(uint64_t offset) { eccFailures->insert(chipOffset + PageOf(offset)); }
 
   // Transfers: 0 or an errno value, *done = bytes moved.
   int Read(uint64_t offset, void* buffer, size_t count, size_t* done);
@@ -91,6 +104,10 @@ struct DeviceNode {
   uint64_t PageOf(uint64_t offset) const { return offset - offset % writeSize; }
   void ScrambleFailedPages(uint64_t offset, size_t n, uint8_t* bytes);
   int Program(uint64_t offset, const uint8_t* data, size_t count);
+  // Notes a NAND page programmed again with other data over cells that were
+  // not erased.
+  void CheckReprogram(uint64_t page, const uint8_t* cells, const uint8_t* data);
+  int EraseBlock(uint64_t block);
 };
 
 }  // namespace devmodel

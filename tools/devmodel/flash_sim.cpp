@@ -146,7 +146,12 @@ FILE* SimFopen(const char* path, const char* mode) {
     FlashSim::Node* node = sim->Find(name);
     if (node == nullptr && sim->PassesThrough()) {
       delete cookie;
-      return Libc().fopen64(sim->HostPath(path).c_str(), mode);
+      std::string host = sim->HostPath(path);
+      if (create && host != name && access(host.c_str(), F_OK) != 0) {
+        errno = ENOENT;  // nothing is created in the device's own trees
+        return nullptr;
+      }
+      return Libc().fopen64(host.c_str(), mode);
     }
     if (node == nullptr && !create) {
       delete cookie;
@@ -339,6 +344,7 @@ DeviceNode* FlashSim::AddPartition(int number, const std::string& name, const st
   node->storage = MakeWindowStorage(*chip->storage, offset, size);
   node->chip = chip;
   node->badBlocks = chip->badBlocks;
+  node->eccFailures = chip->eccFailures;
   node->chipOffset = chip->chipOffset + offset;
   node->LoadBadBlocks();
   nodes_["/dev/mtd" + std::to_string(number)] = node;
@@ -433,7 +439,7 @@ bool FlashSim::IsBad(const std::string& path, uint64_t offset) const {
 
 void FlashSim::AddEccFailure(const std::string& path, uint64_t offset) {
   Node* node = Find(path);
-  if (node != nullptr) node->eccFailures.insert(offset);
+  if (node != nullptr) node->AddEccFailure(offset);
 }
 
 void FlashSim::FailWritesAt(const std::string& path, uint64_t offset) {
@@ -484,8 +490,11 @@ int FlashSim::Open(const char* path, int flags, mode_t mode) {
   std::string name(path);
   auto found = nodes_.find(name);
   bool devMem = name == kDevMemPath && !(PassesThrough() && memory_.empty());
-  if (found == nodes_.end() && !devMem && PassesThrough())
-    return Libc().open(HostPath(path).c_str(), flags, mode);
+  if (found == nodes_.end() && !devMem && PassesThrough()) {
+    std::string host = HostPath(path);
+    if (host != name) flags &= ~O_CREAT;  // nothing is created in the device's own trees
+    return Libc().open(host.c_str(), flags, mode);
+  }
   Handle handle;
   if (devMem) {
     handle.devMem = true;

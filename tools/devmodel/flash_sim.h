@@ -75,7 +75,8 @@ class FlashSim {
   void Poke(const std::string& path, uint64_t offset, const std::vector<uint8_t>& data);
   void MarkBad(const std::string& path, uint64_t offset);
   bool IsBad(const std::string& path, uint64_t offset) const;
-  // Every read touching the page that holds offset fails its ECC checks.
+  // Every read touching the page that holds offset fails its ECC checks
+  // until the page's block is erased.
   void AddEccFailure(const std::string& path, uint64_t offset);
   // Writes covering offset program up to the end of its page, then fail
   // with EIO (a weak page), until cleared.
@@ -104,7 +105,10 @@ class FlashSim {
   void SetFirstDescriptor(int fd) { firstFd_ = fd; }
   // Host mode: a path that is no node goes to the C library, rewritten by
   // hostPath; a node's descriptor is a real one (of /dev/null), so it never
-  // collides with the process's own; no write history is kept.
+  // collides with the process's own; no write history is kept. A path that
+  // hostPath moves lies in the device's own trees (its /dev, /proc, /sys),
+  // which hold what was put there: an open or fopen never creates a file in
+  // them (ENOENT), so a write to a node the device lacks fails.
   void PassThrough(std::function<std::string(const char*)> hostPath);
 
   using Node = DeviceNode;

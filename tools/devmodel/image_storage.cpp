@@ -6,10 +6,11 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cctype>
 #include <cerrno>
-#include <cstdlib>
 #include <cstring>
 #include <fstream>
+#include <map>
 #include <set>
 #include <vector>
 
@@ -17,9 +18,9 @@ namespace stbplat {
 namespace devmodel {
 namespace {
 
-// Offset of the bad-block marker in a page's OOB bytes.
-constexpr size_t kBadMarkerByte = 0;
 constexpr unsigned char kBadMarker = 0x00;
+constexpr uint64_t kSmallPage = 512;
+constexpr uint64_t kSmallPageMarkerByte = 5;
 // Pages read at once from an image with OOB bytes: one system call per page
 // would be the bottleneck.
 constexpr uint64_t kSpanPages = 64;
@@ -28,8 +29,8 @@ std::string BadListPath(const std::string& imagePath) { return imagePath + ".bad
 
 class ImageStorage : public SimStorage {
  public:
-  ImageStorage(int fd, const std::string& path, const Geometry& geometry, bool hasOob)
-      : fd_(fd), path_(path), geometry_(geometry), hasOob_(hasOob) {}
+  ImageStorage(int fd, const std::string& path, const Geometry& geometry, bool readOnly)
+      : fd_(fd), path_(path), geometry_(geometry), hasOob_(geometry.oobInImage), readOnly_(readOnly) {}
   ~ImageStorage() override { close(fd_); }
   ImageStorage(const ImageStorage&) = delete;
   ImageStorage& operator=(const ImageStorage&) = delete;
@@ -50,6 +51,7 @@ class ImageStorage : public SimStorage {
   int Erase(uint64_t offset, uint64_t length) override;
   std::vector<uint64_t> BadBlocks() const override { return {bad_.begin(), bad_.end()}; }
   int SaveBadBlock(uint64_t offset) override;
+  bool ReadOnly() const override { return readOnly_; }
 
  private:
   uint64_t FileOffset(uint64_t dataOffset) const {
@@ -58,7 +60,7 @@ class ImageStorage : public SimStorage {
     return page * (geometry_.writeSize + geometry_.oobSize) + dataOffset % geometry_.writeSize;
   }
   off_t MarkerOffset(uint64_t block) const {
-    return static_cast<off_t>(FileOffset(block) + geometry_.writeSize + kBadMarkerByte);
+    return static_cast<off_t>(FileOffset(block) + geometry_.writeSize + BadMarkerByte(geometry_));
   }
   void LoadBadMarkers();
   bool LoadBadList(std::string* error);
@@ -67,6 +69,7 @@ class ImageStorage : public SimStorage {
   std::string path_;
   Geometry geometry_;
   bool hasOob_;
+  bool readOnly_;
   std::set<uint64_t> bad_;  // block start offsets
 };
 
@@ -80,20 +83,25 @@ void ImageStorage::LoadBadMarkers() {
 bool ImageStorage::LoadBadList(std::string* error) {
   std::ifstream in(BadListPath(path_));
   if (!in) return true;  // no list: every block is good
+  const uint64_t blocks = geometry_.size / geometry_.eraseSize;
+  std::map<uint64_t, unsigned> lineOf;
   std::string line;
-  unsigned lineNumber = 0;
-  while (std::getline(in, line)) {
-    ++lineNumber;
-    size_t hash = line.find('#');
-    if (hash != std::string::npos) line.erase(hash);
+  for (unsigned lineNumber = 1; std::getline(in, line); ++lineNumber) {
+    line.erase(std::min(line.find('#'), line.size()));
     size_t first = line.find_first_not_of(" \t\r");
     if (first == std::string::npos) continue;
-    char* end = nullptr;
-    unsigned long long block = std::strtoull(line.c_str() + first, &end, 0);
-    if (end == line.c_str() + first || block >= geometry_.size / geometry_.eraseSize) {
-      *error = BadListPath(path_) + ":" + std::to_string(lineNumber) + ": not a block number of this image";
+    std::string text = line.substr(first, line.find_last_not_of(" \t\r") + 1 - first);
+    uint64_t block = 0;
+    std::string where = BadListPath(path_) + ":" + std::to_string(lineNumber) + ": ";
+    if (!ParseNumber(text, &block) || block >= blocks) {
+      *error = where + "'" + text + "' is not a block number of this image (0 to " + std::to_string(blocks - 1) + ")";
       return false;
     }
+    if (lineOf.count(block) != 0) {
+      *error = where + "block " + text + " listed again (first at line " + std::to_string(lineOf[block]) + ")";
+      return false;
+    }
+    lineOf[block] = lineNumber;
     bad_.insert(block * geometry_.eraseSize);
   }
   return true;
@@ -162,25 +170,48 @@ int ImageStorage::SaveBadBlock(uint64_t offset) {
   return out ? 0 : EIO;
 }
 
-// What the size of a NAND file should have been, with the likely cause.
-std::string ExpectedSizes(const Geometry& g, uint64_t fileSize) {
-  std::string expected = std::to_string(g.size);
-  if (g.medium != Medium::kNand || g.oobSize == 0 || g.writeSize == 0 || g.eraseSize == 0) return expected;
-  uint64_t withOob = g.size / g.writeSize * (g.writeSize + g.oobSize);
+// Why a NAND file may have the wrong size, as far as its size tells.
+std::string SizeHint(const Geometry& g, uint64_t fileSize) {
+  if (g.medium != Medium::kNand || g.oobSize == 0) return "";
+  uint64_t pages = g.size / g.writeSize;
   uint64_t blockBytes = g.eraseSize / g.writeSize * (g.writeSize + g.oobSize);
-  expected += " (plain) or " + std::to_string(withOob) + " (with OOB)";
+  if (!g.oobInImage)
+    return fileSize == pages * (g.writeSize + g.oobSize) ? " (the size with OOB bytes: drop layout = plain)" : "";
+  if (fileSize == g.size) return " with the OOB bytes of each page (a dump without them needs layout = plain)";
   // nanddump leaves bad blocks out unless told otherwise, and then their
   // places are lost.
-  if (fileSize % blockBytes == 0 && fileSize < withOob)
-    expected += "; a dump short of whole blocks lacks its bad blocks: take it with nanddump --oob --bb=dumpbad";
-  return expected;
+  if (fileSize % blockBytes == 0 && fileSize < pages * (g.writeSize + g.oobSize))
+    return "; a dump short of whole blocks lacks its bad blocks: take it with nanddump --oob --bb=dumpbad";
+  return "";
 }
 
 }  // namespace
 
+uint64_t BadMarkerByte(const Geometry& geometry) {
+  return geometry.writeSize <= kSmallPage ? kSmallPageMarkerByte : 0;
+}
+
+bool ParseNumber(const std::string& text, uint64_t* value) {
+  bool hex = text.size() > 2 && text[0] == '0' && (text[1] == 'x' || text[1] == 'X');
+  const uint64_t base = hex ? 16 : 10;
+  if (text.empty()) return false;
+  uint64_t result = 0;
+  for (size_t i = hex ? 2 : 0; i < text.size(); ++i) {
+    const int c = static_cast<unsigned char>(text[i]);
+    const int digit = std::isdigit(c) ? c - '0' : hex && std::isxdigit(c) ? std::tolower(c) - 'a' + 10 : -1;
+    if (digit < 0 || result > (UINT64_MAX - static_cast<uint64_t>(digit)) / base) return false;
+    result = result * base + static_cast<uint64_t>(digit);
+  }
+  *value = result;
+  return true;
+}
+
 std::unique_ptr<SimStorage> OpenImageStorage(const std::string& path, const Geometry& geometry,
                                              std::string* error) {
+  // An image the user may not write (or on a read-only mount) is still read.
   int fd = open(path.c_str(), O_RDWR | O_CLOEXEC);
+  bool readOnly = fd < 0 && (errno == EACCES || errno == EPERM || errno == EROFS);
+  if (readOnly) fd = open(path.c_str(), O_RDONLY | O_CLOEXEC);
   struct stat info;
   if (fd < 0 || fstat(fd, &info) != 0) {
     *error = path + ": " + std::strerror(errno);
@@ -188,14 +219,15 @@ std::unique_ptr<SimStorage> OpenImageStorage(const std::string& path, const Geom
     return nullptr;
   }
   uint64_t fileSize = static_cast<uint64_t>(info.st_size);
-  bool withOob = geometry.medium == Medium::kNand && geometry.oobSize != 0 && geometry.writeSize != 0 &&
-                 fileSize == geometry.size / geometry.writeSize * (geometry.writeSize + geometry.oobSize);
-  if (!withOob && fileSize != geometry.size) {
-    *error = path + ": " + std::to_string(fileSize) + " bytes, expected " + ExpectedSizes(geometry, fileSize);
+  uint64_t expected = geometry.size;
+  if (geometry.oobInImage) expected = geometry.size / geometry.writeSize * (geometry.writeSize + geometry.oobSize);
+  if (fileSize != expected) {
+    *error = path + ": " + std::to_string(fileSize) + " bytes, expected " + std::to_string(expected) +
+             SizeHint(geometry, fileSize);
     close(fd);
     return nullptr;
   }
-  auto image = std::make_unique<ImageStorage>(fd, path, geometry, withOob);
+  auto image = std::make_unique<ImageStorage>(fd, path, geometry, readOnly);
   if (!image->LoadBadBlocks(error)) return nullptr;
   return image;
 }

@@ -47,6 +47,7 @@ class WindowStorage : public SimStorage {
   int Resize(uint64_t) override { return EINVAL; }
   int Erase(uint64_t offset, uint64_t length) override { return whole_.Erase(offset_ + offset, length); }
   int SaveBadBlock(uint64_t offset) override { return whole_.SaveBadBlock(offset_ + offset); }
+  bool ReadOnly() const override { return whole_.ReadOnly(); }
 
  private:
   SimStorage& whole_;

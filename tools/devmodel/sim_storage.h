@@ -30,6 +30,8 @@ class SimStorage {
   // and the record of a block marked bad since.
   virtual std::vector<uint64_t> BadBlocks() const { return {}; }
   virtual int SaveBadBlock(uint64_t) { return 0; }
+  // True when the bytes can only be read (the node refuses every change).
+  virtual bool ReadOnly() const { return false; }
 };
 
 constexpr uint8_t kErasedByte = 0xFF;

@@ -19,22 +19,29 @@ class DeviceRoot {
  public:
   // Reads proc/mtd and the settings beside the images, and adds every
   // partition and eMMC device to sim. On failure returns false and says
-  // which file is wrong.
+  // which file is wrong, with the line where it has lines.
   static bool Load(const std::string& root, devmodel::FlashSim& sim, std::string* error);
 
  private:
+  // A line of proc/mtd.
+  struct Row {
+    int number;
+    uint64_t size, eraseSize;
+    std::string name;
+    std::string where;  // "ROOT/proc/mtd:LINE", for the messages
+  };
+
   DeviceRoot(const std::string& root, devmodel::FlashSim& sim) : root_(root), sim_(sim) {}
   // The node of image `name` (dev/NAME), added on first use.
   devmodel::DeviceNode* Image(const std::string& name, std::string* error);
-  bool LoadNode(int number, uint64_t size, uint64_t eraseSize, const std::string& name, std::string* error);
+  bool LoadNode(const Row& row, std::string* error);
   bool LoadEmmcDevices(std::string* error);
 
   std::string root_;
   devmodel::FlashSim& sim_;
   std::map<std::string, devmodel::Geometry> images_;
-  // proc/mtd sizes and names, for partitions used as images of others.
-  std::map<std::string, std::pair<uint64_t, uint64_t>> mtdSizes_;
-  std::map<std::string, std::string> mtdNames_;
+  // The rows by node name ("mtd7"), for partitions used as images of others.
+  std::map<std::string, Row> rows_;
 };
 
 // Where a device path lies on the host: under root for /dev, /proc and /sys,

@@ -104,6 +104,11 @@ bool LoadDisk(const std::string& root, const std::string& name, devmodel::DiskSi
 
 }  // namespace
 
+bool IsDiskName(const std::string& name) {
+  return name.size() > std::strlen(kDiskPrefix) && name.compare(0, std::strlen(kDiskPrefix), kDiskPrefix) == 0 &&
+         name.find_first_not_of("abcdefghijklmnopqrstuvwxyz", std::strlen(kDiskPrefix)) == std::string::npos;
+}
+
 bool LoadDisks(const std::string& root, devmodel::DiskSim& sim, std::string* error) {
   std::string modules;
   if (Slurp(root + kModuleList, &modules)) sim.tools["lsmod"] = modules;
@@ -112,8 +117,8 @@ bool LoadDisks(const std::string& root, devmodel::DiskSim& sim, std::string* err
   bool ok = true;
   for (dirent* entry = readdir(dev); ok && entry != nullptr; entry = readdir(dev)) {
     const std::string file = entry->d_name;
-    if (file.compare(0, 2, kDiskPrefix) == 0 && EndsWith(file, kIniSuffix))
-      ok = LoadDisk(root, file.substr(0, file.size() - std::strlen(kIniSuffix)), sim, error);
+    const std::string name = EndsWith(file, kIniSuffix) ? file.substr(0, file.size() - std::strlen(kIniSuffix)) : "";
+    if (IsDiskName(name)) ok = LoadDisk(root, name, sim, error);
   }
   closedir(dev);
   return ok;

@@ -19,6 +19,10 @@
 namespace stbplat {
 namespace hostsim {
 
+// Whether dev/NAME.ini describes a disk (sda, sdb, ... sdaa): the flash
+// loader leaves those to this one.
+bool IsDiskName(const std::string& name);
+
 // Adds the root's disks to sim. On failure returns false and says which
 // file is wrong.
 bool LoadDisks(const std::string& root, devmodel::DiskSim& sim, std::string* error);

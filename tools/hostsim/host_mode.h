@@ -5,10 +5,14 @@
 //                           without it the device has only its MTD partitions
 //   proc/mtd                the kernel's partition table, as on the device
 //   dev/mtdN                one image per MTD partition
-//   dev/mtdN.ini            its geometry: type (nor, nand, emmc), erase and
-//                           page size, OOB size, bad blocks
+//   dev/mtdN.ini            its geometry: medium (nor, nand, emmc), size,
+//                           erase and page size, OOB size and whether the
+//                           image holds the OOB bytes (layout = oob, plain);
+//                           or the image it is a window of, and where
+//   dev/mtdN.bad            the bad blocks of a NAND image without OOB bytes
 //   dev/mmca                the whole eMMC device
 //   dev/sdX.ini ...         hard disks and their tools' output (disk_root.h)
+// README.md tells the keys and the checks made on them.
 // While attached, the library's device and file calls for /proc/mtd and
 // /dev/... are answered from these files, every other path is passed on, and
 // the platform's memory map is the one in the root.
