@@ -11,6 +11,7 @@
 #include <map>
 #include <sstream>
 
+#include "devmodel/image_storage.h"
 #include "util/ini_core.h"
 
 namespace stbplat {
@@ -49,20 +50,13 @@ bool EndsWith(const std::string& text, const std::string& suffix) {
 }
 
 // A decimal or 0x number of at most `limit`.
-bool Number(const Settings& settings, const char* key, unsigned long long limit, long long* value,
+bool Number(const Settings& settings, const char* key, uint64_t limit, long long* value,
             const std::string& where, std::string* error) {
   auto it = settings.find(key);
   if (it == settings.end()) return true;
-  const std::string& text = it->second;
-  const bool hex = text.compare(0, 2, "0x") == 0 || text.compare(0, 2, "0X") == 0;
-  const std::string digits = hex ? text.substr(2) : text;
-  const char* allowed = hex ? "0123456789abcdefABCDEF" : "0123456789";
-  char* end = nullptr;
-  errno = 0;
-  const unsigned long long parsed = std::strtoull(digits.c_str(), &end, hex ? 16 : 10);
-  if (digits.empty() || digits.find_first_not_of(allowed) != std::string::npos || errno != 0 ||
-      parsed > limit) {
-    *error = where + ": " + key + " = " + text + " is not a number up to " + std::to_string(limit);
+  uint64_t parsed = 0;
+  if (!devmodel::ParseNumber(it->second, &parsed) || parsed > limit) {
+    *error = where + ": " + key + " = " + it->second + " is not a number up to " + std::to_string(limit);
     return false;
   }
   *value = static_cast<long long>(parsed);
