@@ -52,7 +52,8 @@ const Row kRows[] = {
     {{"crc32", "@/check.txt", "-"}, 0, kExactOut, "0xCBF43926  @/check.txt\n0xCBF43926  -\n",
      "123456789"},
     {{"crc16", "@/long.bin"}, 0, kExactOut, "0x6E80  @/long.bin\n"},  // KERMIT over 70000 'a'
-    {{"crc32", "/nonexistent/file"}, 1, kErr, "/nonexistent/file"},
+    {{"crc32", "/nonexistent/file"}, 1, kErr, "/nonexistent/file: No such file or directory"},
+    {{"crc32", "@"}, 1, kErr, "@: Is a directory"},
     // Hex dump: the library's lines, an offset past the end.
     {{"hexdump", "@/dump.bin"}, 0, kExactOut,
      "00000000  41 42 43 44 45 46 47 48 49 4A 4B 4C 4D 4E 4F 50      ABCDEFGHIJKLMNOP\n"
@@ -94,9 +95,8 @@ const Row kRows[] = {
     {{"recrod", "show"}, 2, kErr, "'recrod'\nDid you mean 'record'?"},
     {{"flash"}, 2, kErr, "stbplat: flash needs a command: read, write, erase, erase-sector\n"},
     {{"--version"}, 0, kOut, "stbplat "},
-    // -q keeps the library's messages back, the tool's own error stays.
-    {{"-q", "--root", "@/device", "record", "show", "NOR0.PANL.A"}, 1, kExactErr,
-     "stbplat: cannot open location NOR0.PANL.A\n"},
+    {{"--root", "@/device", "record", "show", "NOR0.PANL.A"}, 2, kErr,
+     "SOURCE: no slot NOR0.PANL.A (known: NOR0.BOOT.A, NOR0.FSBLINFO.A, NOR0.BLDCFG.A, NOR0.PANEL.A, "},
     {{"hexdump", "--indent", "500", "x"}, 2, kErr, "--indent"},
     {{"hexdump", "-n", "-1", "@/dump.bin"}, 2, kErr, "--length: '-1' is not a number"},
     {{"record", "show", kNor, "--at", "-5"}, 2, kErr, "--at: '-5' is not a number"},
@@ -111,6 +111,7 @@ const Row kRows[] = {
     // Its disk: identity and size from the ioctls, the temperature from smartctl through awk.
     {{"--root", "@/device", "disk", "info"}, 0, kOut, "serial     Z9A1EXMP\nsize       931.5 GiB"},
     {{"--root", "@/device", "disk", "temp"}, 0, kExactOut, "36 C\n"},
+    {{"--root", "@/device", "disk", "info", "sdb"}, 1, kErr, "cannot open /dev/sdb: No such file or directory"},
     // ROOTFS.A starts on a bad block: the record comes from the next one.
     {{"--root", "@/device", "record", "show", "NAND0.ROOTFS.A"}, 0, kOut, "root file system 2026.11b"},
     {{"--root", "@/device", "record", "show", "EMMC0.APPS.B"}, 0, kOut, "applications 1.3c"},
@@ -125,7 +126,7 @@ const Row kRows[] = {
      kErr, "ECC error reading the flash device /dev/mtd6"},
     // Refused changes; the image is compared with the original afterwards.
     {{"--root", "@/device", "flash", "erase", "NOR0.BOOT.A"}, 2, kErr, "add --yes to go ahead"},
-    {{"--root", "@/device", "flash", "erase", "NOR0.NOPE.A", "--yes"}, 1, kErr, "NOR0.NOPE.A"},
+    {{"--root", "@/device", "flash", "erase", "NOR0.NOPE.A", "--yes"}, 2, kErr, "no slot NOR0.NOPE.A"},
     {{"--root", "@/device", "flash", "read", "NOR0.BOOT.A", "-n", "1M", "-o", "@/x"}, 2, kErr,
      "--length 0x100000 runs past the end of NOR0.BOOT.A (65536 bytes left)"},
     {{"--root", "@/device", "flash", "write", "NOR0.BOOT.A", "@/long.bin", "--yes"}, 2, kErr,
@@ -143,7 +144,7 @@ const Row kRows[] = {
      "runs past the end of its partition (0x10000 bytes left)"},
     {{"--root", "@/device", "flash", "erase-sector", "EMMC0.APPS.B", "--yes"}, 2, kErr, "no erase sectors"},
     // A read from a slot that is not there leaves the output file alone.
-    {{"--root", "@/device", "flash", "read", "NOR0.PANL.A", "-n", "16", "-o", "@/check.txt"}, 1, kErr, "PANL"},
+    {{"--root", "@/device", "flash", "read", "NOR0.PANL.A", "-n", "16", "-o", "@/check.txt"}, 2, kErr, "PANL"},
     {{"crc32", "@/check.txt"}, 0, kExactOut, "0xCBF43926  @/check.txt\n"},
     // A new front-panel text goes into its slot.
     {{"record", "make", "front-panel", "GOODBYE", "-o", "@/panel.bin"}, 0, kExactOut, ""},
@@ -154,6 +155,9 @@ const Row kRows[] = {
     // first byte that did not take.
     {{"--root", "@/device", "flash", "write", "NOR0.PANEL.A", "-", "--verify", "--yes"}, 1, kErr,
      "differs from - at offset 0x0 (wrote 0x0D, read 0x01)", "\x0D"},
+    // A page programmed again fails ECC; -q keeps the library's message back, the tool's own error stays.
+    {{"-q", "--root", "@/device", "flash", "write", "NAND0.KERNEL.A", "@/dump.bin", "--verify", "--yes"}, 1,
+     kExactErr, "stbplat: flash write --verify: NAND0.KERNEL.A: reading back failed at 0x0\n"},
 };
 
 std::string Expand(std::string text, const std::string& dir) {

@@ -2,6 +2,8 @@
 // current temperature (one reading through smartctl).
 #include <CLI/CLI.hpp>
 
+#include <cerrno>
+#include <cstring>
 #include <iostream>
 #include <string>
 
@@ -33,13 +35,15 @@ void RunDiskInfo(const std::string& device) {
   int opened = -1;
   int isDisk = 0;
   unsigned long size = kSizeUnknown;
+  int openError = 0;
   std::string printed = CaptureStandardOutput([&]() {
     std::string name = device;
     opened = GetVendorInfo(&name[0]);
+    openError = errno;
     size = GetBlkDevSize(device.c_str());
     isDisk = IsDevHDD(device.c_str());
   });
-  if (opened != 0) throw Failure("disk info: cannot open /dev/" + device);
+  if (opened != 0) throw Failure("disk info: cannot open /dev/" + device + ": " + std::strerror(openError));
   std::string model = FieldAfter(printed, "Hard Disk Model:");
   std::string serial = FieldAfter(printed, "Serial Number:");
   if (Options().json) {

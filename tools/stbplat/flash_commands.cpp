@@ -105,6 +105,7 @@ Target ParseTarget(const std::string& text, bool mtd, const std::string& command
     throw UsageError(command + ": TARGET '" + text +
                      "': expected DEVICE.PARTITION.SLOT[+OFFSET], --mtd NAME or a NOR address");
   t.offset = t.location.offset;
+  RequireKnownSlot(t.location, command);
   // A slot with a partition of its own tells its size (less its bad
   // blocks); any other slot takes its size from the memory map.
   std::string upper = t.location.device + "." + t.location.partition + "." + t.location.slot;

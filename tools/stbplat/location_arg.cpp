@@ -9,7 +9,9 @@
 #include <cstring>
 #include <limits>
 
+#include "memory_layout.h"
 #include "output.h"
+#include "stbplat/memory_map.h"
 #include "tool.h"
 
 namespace stbtool {
@@ -124,6 +126,21 @@ ComponentLocation ToComponentLocation(const LocationArg& arg, const std::string&
 std::string LocationText(const Location& location) {
   return NameOf(location.deviceName) + "." + NameOf(location.partitionName) + "." +
          NameOf(location.slotName);
+}
+
+void RequireKnownSlot(const LocationArg& arg, const std::string& command) {
+  ExtendedMemoryMapStructure* map = ExtendedMemoryMapStructure::Instance();
+  if (!map->IsCreated()) return;  // no map to tell; the library says what it finds
+  Location location = ToComponentLocation(arg).location;
+  unsigned long size = 0, offset = 0;
+  if (map->GetSlotSizeAndOffset(&location, &size, &offset)) return;
+  bool fromMemoryMap = false;
+  std::string known;
+  for (const LayoutDevice& device : LoadLayout(LoadDeviceTable(false), &fromMemoryMap))
+    for (const LayoutPartition& partition : device.partitions)
+      for (const LayoutSlot& slot : partition.slots)
+        known += (known.empty() ? "" : ", ") + device.name + "." + partition.name + "." + slot.name;
+  throw UsageError(command + ": no slot " + LocationText(location) + " (known: " + known + ")");
 }
 
 }  // namespace stbtool

@@ -29,6 +29,10 @@ bool ParseLocationArg(const std::string& text, const std::string& what, Location
 // The library's form, with the given component tag (up to 4 characters).
 ComponentLocation ToComponentLocation(const LocationArg& arg, const std::string& tag = "");
 
+// Refuses (UsageError, exit 2) a slot the memory map does not hold, naming
+// the slots it holds. Without a memory map there is nothing to check.
+void RequireKnownSlot(const LocationArg& arg, const std::string& command);
+
 // "NAND0.KERNEL.A" from the library's 8-byte names.
 std::string LocationText(const Location& location);
 

@@ -1,5 +1,6 @@
 #include "output.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cctype>
@@ -135,10 +136,12 @@ std::vector<unsigned char> ReadWholeFile(const std::string& path) {
       bytes.insert(bytes.end(), buffer, buffer + got);
     return bytes;
   }
+  // A directory opens, and then fails the first read.
+  struct stat info;
+  if (stat(path.c_str(), &info) == 0 && S_ISDIR(info.st_mode)) throw Failure(path + ": " + std::strerror(EISDIR));
   std::ifstream in(path, std::ios::binary);
   if (!in) throw Failure(path + ": " + std::strerror(errno));
-  return std::vector<unsigned char>(std::istreambuf_iterator<char>(in),
-                                    std::istreambuf_iterator<char>());
+  return std::vector<unsigned char>(std::istreambuf_iterator<char>(in), {});
 }
 
 void WriteWholeFile(const std::string& path, const std::vector<unsigned char>& bytes) {

@@ -95,6 +95,7 @@ RecordSource LoadRecordSource(const std::string& source, unsigned long offset) {
     if (arg.hasOffset) throw UsageError("give the offset of '" + source + "' once, not also with --at");
     arg.offset = offset;
   }
+  RequireKnownSlot(arg, "SOURCE");
   Location slot = ToComponentLocation(arg).location;
   unsigned long slotSize = 0, slotOffset = 0, room = std::numeric_limits<unsigned long>::max();
   if (ExtendedMemoryMapStructure::Instance()->GetSlotSizeAndOffset(&slot, &slotSize, &slotOffset)) {
