@@ -148,7 +148,7 @@ const Row kRows[] = {
     {{"crc32", "@/check.txt"}, 0, kExactOut, "0xCBF43926  @/check.txt\n"},
     // A new front-panel text goes into its slot.
     {{"record", "make", "front-panel", "GOODBYE", "-o", "@/panel.bin"}, 0, kExactOut, ""},
-    {{"--root", "@/device", "flash", "erase", "NOR0.PANEL.A", "--yes"}, 0, kErr, ""},
+    {{"--json", "--root", "@/device", "flash", "erase", "NOR0.PANEL.A", "--yes"}, 0, kOut, "\"erased\": \"whole\""},
     {{"--root", "@/device", "flash", "write", "NOR0.PANEL.A", "@/panel.bin", "--yes"}, 0, kErr, ""},
     {{"--root", "@/device", "record", "show", "NOR0.PANEL.A"}, 0, kOut, "text: \"GOODBYE\""},
     // NOR programming without an erase only clears bits: --verify names the

@@ -491,7 +491,9 @@ void RunWrite(const TransferArgs& args) {
     EraseSlotOf(t, "flash write --erase");
   }
   unsigned long written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0, args.erase);
-  if (!Options().json)
+  if (Options().json)
+    PrintJson({{"target", t.text}, {"written", written}, {"verified", args.verify}, {"erasedFirst", args.erase}});
+  else
     std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << "\n";
 }
 
@@ -561,7 +563,10 @@ void RunErase(const EraseArgs& args, bool sectorOnly) {
     ok = sectorOnly ? flash->EraseSector(&location) : EraseLocation(location, t.text);
   }
   if (!ok) throw Failure(command + ": erasing " + t.text + " failed");
-  if (!Options().json) std::cerr << "erased " << t.text << (sectorOnly ? " (first erase unit)" : "") << "\n";
+  if (Options().json)
+    PrintJson({{"target", t.text}, {"erased", sectorOnly ? "first erase unit" : "whole"}});
+  else
+    std::cerr << "erased " << t.text << (sectorOnly ? " (first erase unit)" : "") << "\n";
 }
 
 void RunMtdList() {
