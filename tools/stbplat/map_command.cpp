@@ -1,6 +1,10 @@
 // map: a picture of the device's flash, chips drawn to scale with their
 // partitions and slots, bad blocks marked; on the terminal or as SVG.
 #include <CLI/CLI.hpp>
+#include <langinfo.h>
+
+#include <clocale>
+#include <cstring>
 
 #include <algorithm>
 #include <fstream>
@@ -69,6 +73,25 @@ Row MakeRow(const std::vector<Cell>& ranges, unsigned long size) {
   return row;
 }
 
+// Box drawing where the terminal's locale is UTF-8, ASCII elsewhere.
+struct Glyphs {
+  const char *topLeft, *topRight, *bottomLeft, *bottomRight, *left, *right, *cross, *up, *down, *across, *side;
+  const char *bad, *good;
+};
+
+const Glyphs& MapGlyphs() {
+  static const Glyphs glyphs = [] {
+    static const Glyphs box{"┌", "┐", "└", "┘", "├", "┤", "┼", "┴", "┬", "─", "│", "▓", "·"};
+    static const Glyphs ascii{"+", "+", "+", "+", "+", "+", "+", "+", "+", "-", "|", "#", "."};
+    const std::string saved = std::setlocale(LC_CTYPE, nullptr);
+    std::setlocale(LC_CTYPE, "");
+    const bool utf8 = std::strcmp(nl_langinfo(CODESET), "UTF-8") == 0;
+    std::setlocale(LC_CTYPE, saved.c_str());
+    return utf8 ? box : ascii;
+  }();
+  return glyphs;
+}
+
 bool BoundaryAt(const Row& row, int column) {
   for (const Cell& c : row)
     if (c.first == column || c.last == column) return true;
@@ -81,19 +104,20 @@ std::string Rule(const Row* above, const Row* below) {
   for (int c = 0; c <= kBarWidth; ++c) {
     bool up = above && BoundaryAt(*above, c);
     bool down = below && BoundaryAt(*below, c);
-    if (c == 0) line += !above ? "┌" : !below ? "└" : "├";
-    else if (c == kBarWidth) line += !above ? "┐" : !below ? "┘" : "┤";
-    else if (up && down) line += "┼";
-    else if (up) line += "┴";
-    else if (down) line += "┬";
-    else line += "─";
+    const Glyphs& g = MapGlyphs();
+    if (c == 0) line += !above ? g.topLeft : !below ? g.bottomLeft : g.left;
+    else if (c == kBarWidth) line += !above ? g.topRight : !below ? g.bottomRight : g.right;
+    else if (up && down) line += g.cross;
+    else if (up) line += g.up;
+    else if (down) line += g.down;
+    else line += g.across;
   }
   return line;
 }
 
 std::string Cells(const Row& row) {
-  std::string line = "│";
-  for (const Cell& c : row) line += Fit(c.label, c.last - c.first - 1) + "│";
+  std::string line = MapGlyphs().side;
+  for (const Cell& c : row) line += Fit(c.label, c.last - c.first - 1) + MapGlyphs().side;
   return line;
 }
 
@@ -151,9 +175,9 @@ void DrawTerminal(const std::vector<LayoutDevice>& devices) {
     std::cout << pad << Rule(&partitionRow, &slotRow) << "\n";
     std::cout << "  slots " << Cells(slotRow) << "\n";
     if (device.medium == Medium::kNand) {
-      std::string blocks = "│";
-      for (int c = 1; c < kBarWidth; ++c) blocks += BadInColumn(device, c) ? "▓" : "·";
-      blocks += "│";
+      std::string blocks = MapGlyphs().side;
+      for (int c = 1; c < kBarWidth; ++c) blocks += BadInColumn(device, c) ? MapGlyphs().bad : MapGlyphs().good;
+      blocks += MapGlyphs().side;
       std::cout << "  bad   " << blocks << "\n";
     }
     std::cout << pad << Rule(&slotRow, nullptr) << "\n";
