@@ -1,6 +1,6 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build demo test check test-unit test-asan test-aarch64 test-fuzz test-system test-system-aarch64 bench clean
+.PHONY: all deps build tool demo test check test-unit test-asan test-aarch64 test-fuzz test-system test-system-aarch64 bench clean
 
 all: build
 
@@ -10,6 +10,12 @@ deps:
 build: deps
 	cmake --preset default >/dev/null
 	cmake --build --preset default
+
+# The library and the stbplat tool alone, without tests or examples:
+# build/default/tools/stbplat.
+tool: deps
+	cmake --preset default >/dev/null
+	cmake --build --preset default --target stbplat stbplat_tool
 
 demo: build
 	@scripts/demo.sh build/default

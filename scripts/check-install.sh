@@ -32,4 +32,10 @@ export PKG_CONFIG_PATH=$libdir
 # shellcheck disable=SC2046
 g++ -std=c++17 "$consumer/main.cpp" -o "$work/pc-consumer" $(pkg-config --cflags --libs stbplat)
 "$work/pc-consumer"
+# The README's example builds both ways too.
+cmake -S "$src/examples/read-version" -B "$work/example-build" -G Ninja -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
+cmake --build "$work/example-build" >/dev/null
+# shellcheck disable=SC2046
+g++ -std=c++17 "$src/examples/read-version/main.cpp" -o "$work/read-version" $(pkg-config --cflags --libs stbplat)
+"$work/read-version" 2>/dev/null && { echo "check-install: read-version without arguments succeeded" >&2; exit 1; }
 echo "check-install: the installed tool ran; find_package and pkg-config consumers built and ran"
