@@ -109,14 +109,18 @@ int DeviceNode::Write(uint64_t offset, const void* data, size_t count, size_t* d
   if (offset >= Size()) return ENOSPC;
   count = static_cast<size_t>(std::min<uint64_t>(count, Size() - offset));
   if (kind == SimKind::kNand && (offset % writeSize != 0 || count % writeSize != 0)) return EINVAL;
+  if (int error = Reach()) return error;
+  // A full chip takes what lies before the offset it is full from.
+  const uint64_t at = chipOffset + offset;
+  if (at >= faults->fullFrom) return ENOSPC;
+  count = static_cast<size_t>(std::min<uint64_t>(count, faults->fullFrom - at));
   // A weak page fails the write after the pages before it and the page
   // itself were programmed.
   size_t programmed = count;
   bool weakPage = false;
-  for (uint64_t weak : weakOffsets) {
-    if (weak < offset || weak >= offset + count) continue;
+  for (auto weak = faults->weakPages.lower_bound(at); weak != faults->weakPages.end() && *weak < at + count; ++weak) {
     weakPage = true;
-    programmed = std::min<size_t>(programmed, PageOf(weak) + writeSize - offset);
+    programmed = std::min<size_t>(programmed, PageOf(*weak - chipOffset) + writeSize - offset);
   }
   const auto* bytes = static_cast<const uint8_t*>(data);
   // The MTD layer does not consult the bad-block table on writes.
@@ -129,11 +133,18 @@ int DeviceNode::Write(uint64_t offset, const void* data, size_t count, size_t* d
   return 0;
 }
 
+int DeviceNode::Reach() {
+  if (faults->PowerGone()) return EIO;
+  ++faults->writes;
+  return 0;
+}
+
 int DeviceNode::Erase(uint64_t start, uint64_t length) {
   if (start >= Size() || length > Size() - start) return EINVAL;
   if (storage->ReadOnly()) return EROFS;
   if (length == 0) return 0;
   if (eraseSize == 0 || start % eraseSize != 0 || length % eraseSize != 0) return EINVAL;
+  if (int error = Reach()) return error;
   // Block by block: the blocks before a bad one are erased.
   for (uint64_t block = start; block < start + length; block += eraseSize) {
     if (IsBadBlock(block)) {

@@ -16,6 +16,13 @@
 //   erases the block before it marks it; a weak page fails the write with
 //   EIO after the pages before it and the weak page itself were programmed.
 //   Partitions of one chip share its bad-block table.
+// - A chip that is full from an offset on takes the bytes of a write before
+//   that offset (a short write) and fails a write starting at or past it
+//   with ENOSPC, as a device at its end does; erases go on.
+// - A power cut after N writes (write calls and MEMERASE reaching the chip,
+//   through any of its partitions): those N land, every later one fails
+//   with EIO without changing anything (and the simulator fails every
+//   other call too, see FlashSim::CutPowerAfter).
 // - Erase: a region of 0 bytes inside the device succeeds and does nothing;
 //   otherwise block-aligned (EINVAL); blocks are erased in order, and a bad
 //   one stops the erase with EIO after the good blocks before it.
@@ -66,7 +73,15 @@ struct DeviceNode {
   bool readOnly = false;
   // Chip offsets of the pages that fail ECC, shared like badBlocks.
   std::shared_ptr<std::set<uint64_t>> eccFailures = std::make_shared<std::set<uint64_t>>();
-  std::set<uint64_t> weakOffsets;
+  // Faults of the chip, shared by its partitions; offsets in the chip.
+  struct ChipFaults {
+    std::set<uint64_t> weakPages;  // any offset in the page
+    uint64_t fullFrom = UINT64_MAX;
+    uint64_t powerCut = UINT64_MAX;  // writes that land before the cut
+    uint64_t writes = 0;             // writes that reached the chip
+    bool PowerGone() const { return writes >= powerCut; }
+  };
+  std::shared_ptr<ChipFaults> faults = std::make_shared<ChipFaults>();
   uint32_t eccFailed = 0;
   uint32_t badBlockCount = 0;
   uint32_t garbageReads = 0;
@@ -108,6 +123,8 @@ struct DeviceNode {
   // not erased.
   void CheckReprogram(uint64_t page, const uint8_t* cells, const uint8_t* data);
   int EraseBlock(uint64_t block);
+  // A write or erase reaching the chip: counted, or EIO after a power cut.
+  int Reach();
 };
 
 }  // namespace devmodel

@@ -262,6 +262,11 @@ bool FlashSim::Hit(SimCall call, SimCall specific) {
   // Every matching fault counts the call, whichever of them fires.
   bool fire = false;
   int error = 0;
+  for (const auto& cut : cuts_)
+    if (cut->PowerGone()) {
+      fire = true;
+      error = EIO;
+    }
   for (auto& fault : faults_) {
     if (fault->call != SimCall::kAny && fault->call != call && fault->call != specific) continue;
     ++fault->seen;
@@ -345,6 +350,7 @@ DeviceNode* FlashSim::AddPartition(int number, const std::string& name, const st
   node->chip = chip;
   node->badBlocks = chip->badBlocks;
   node->eccFailures = chip->eccFailures;
+  node->faults = chip->faults;
   node->chipOffset = chip->chipOffset + offset;
   node->LoadBadBlocks();
   nodes_["/dev/mtd" + std::to_string(number)] = node;
@@ -444,11 +450,23 @@ void FlashSim::AddEccFailure(const std::string& path, uint64_t offset) {
 
 void FlashSim::FailWritesAt(const std::string& path, uint64_t offset) {
   Node* node = Find(path);
-  if (node != nullptr) node->weakOffsets.insert(offset);
+  if (node != nullptr) node->faults->weakPages.insert(node->chipOffset + offset);
 }
 
 void FlashSim::ClearWriteFailures() {
-  for (auto& entry : nodes_) entry.second->weakOffsets.clear();
+  for (auto& entry : nodes_) entry.second->faults->weakPages.clear();
+}
+
+void FlashSim::FullFrom(const std::string& path, uint64_t offset) {
+  Node* node = Find(path);
+  if (node != nullptr) node->faults->fullFrom = node->chipOffset + offset;
+}
+
+void FlashSim::CutPowerAfter(const std::string& path, uint64_t writes) {
+  Node* node = Find(path);
+  if (node == nullptr) return;
+  node->faults->powerCut = writes;
+  cuts_.push_back(node->faults);
 }
 
 void FlashSim::FailCall(SimCall call, int nth, int error, bool persistent) {

@@ -82,6 +82,13 @@ class FlashSim {
   // with EIO (a weak page), until cleared.
   void FailWritesAt(const std::string& path, uint64_t offset);
   void ClearWriteFailures();
+  // The chip holding path takes no write at or past offset (in path): a
+  // write starting there fails with ENOSPC, one running into it is cut short.
+  void FullFrom(const std::string& path, uint64_t offset);
+  // The power goes after `writes` writes and erases reached the chip holding
+  // path: every later one fails with EIO and changes nothing, and so does
+  // every later call through the seam, whatever it is.
+  void CutPowerAfter(const std::string& path, uint64_t writes);
 
   // Fails the nth matching call (1 = the next one), with errno = error;
   // persistent: that one and every later one.
@@ -155,6 +162,7 @@ class FlashSim {
   std::map<int, Handle> handles_;
   std::vector<std::unique_ptr<Fault>> faults_;
   std::vector<SimCall> failed_;
+  std::vector<std::shared_ptr<DeviceNode::ChipFaults>> cuts_;
   std::array<int, static_cast<size_t>(SimCall::kCount)> counts_{};
   std::map<int, std::string> procLines_;
   std::string procOverride_;

@@ -11,6 +11,7 @@
 #include <fstream>
 #include <iterator>
 #include <regex>
+#include <sstream>
 #include <vector>
 
 #include "util/ini_core.h"
@@ -31,7 +32,8 @@ constexpr uint64_t kDefaultNandPage = 2048;
 // MEMGETINFO reports the erase, page and OOB sizes in 32-bit fields.
 constexpr uint64_t kMax32 = 0xFFFFFFFFu;
 constexpr const char* kDevicePrefixes[] = {"/dev/", "/proc/", "/sys/"};
-constexpr const char* kKeys[] = {"medium", "size", "erasesize", "writesize", "oobsize", "layout", "image", "offset"};
+constexpr const char* kKeys[] = {"medium",   "size",      "erasesize", "writesize", "oobsize",  "layout",  "image",
+                                 "offset",   "readonly",  "weakpages", "eccpages",  "fullfrom", "powercut"};
 // A line of /proc/mtd as the kernel prints it: "mtdN: size erasesize "name"",
 // both sizes in hexadecimal without 0x.
 const char kTableLine[] = "mtd([0-9]{1,3}): ([0-9a-fA-F]{1,16}) ([0-9a-fA-F]{1,16}) \"([^\"]{1,100})\"";
@@ -118,6 +120,60 @@ bool Number(const Settings& settings, const char* key, uint64_t low, uint64_t hi
   return true;
 }
 
+bool Refuse(const std::string& where, const std::string& what, std::string* error) {
+  *error = where + ": " + what;
+  return false;
+}
+
+// A list of offsets in an image of `size` bytes, separated by blanks.
+bool Offsets(const Settings& settings, const char* key, uint64_t size, std::vector<uint64_t>* offsets,
+             std::string* error) {
+  if (!settings.Has(key)) return true;
+  std::istringstream words(settings.Value(key));
+  std::string where = settings.Where(key) + ": " + key;
+  for (std::string word; words >> word;) {
+    uint64_t offset = 0;
+    if (!ParseNumber(word, &offset) || offset >= size) {
+      *error = where + ": " + word + " is not an offset in the image (0 to " + Hex(size - 1) + ")";
+      return false;
+    }
+    offsets->push_back(offset);
+  }
+  return true;
+}
+
+bool YesNo(const Settings& settings, const char* key, bool* value, std::string* error) {
+  if (!settings.Has(key)) return true;
+  const std::string& text = settings.Value(key);
+  if (text != "yes" && text != "no") {
+    *error = settings.Where(key) + ": " + key + " = " + text + " (expected yes or no)";
+    return false;
+  }
+  *value = text == "yes";
+  return true;
+}
+
+// The faults an image declares, on its node at path.
+bool ApplyFaults(const Settings& s, const Geometry& g, const std::string& path, devmodel::FlashSim& sim,
+                 std::string* error) {
+  std::vector<uint64_t> weak, ecc;
+  uint64_t fullFrom = g.size, powerCut = 0;
+  if (!Offsets(s, "weakpages", g.size, &weak, error) || !Offsets(s, "eccpages", g.size, &ecc, error) ||
+      !Number(s, "fullfrom", 0, g.size, &fullFrom, error) || !Number(s, "powercut", 0, UINT64_MAX, &powerCut, error))
+    return false;
+  const bool flash = g.medium != Medium::kEmmc;
+  if ((!weak.empty() || !ecc.empty()) && g.medium != Medium::kNand)
+    return Refuse(s.Where(weak.empty() ? "eccpages" : "weakpages"), "pages that fail are NAND pages", error);
+  if (flash && fullFrom % g.writeSize != 0)
+    return Refuse(s.Where("fullfrom"), "fullfrom " + Hex(fullFrom) + " is not on a page of " + Hex(g.writeSize),
+                  error);
+  for (uint64_t offset : weak) sim.FailWritesAt(path, offset);
+  for (uint64_t offset : ecc) sim.AddEccFailure(path, offset);
+  if (s.Has("fullfrom")) sim.FullFrom(path, fullFrom);
+  if (s.Has("powercut")) sim.CutPowerAfter(path, powerCut);
+  return true;
+}
+
 bool StartsWith(const std::string& text, const char* prefix) {
   return text.compare(0, std::strlen(prefix), prefix) == 0;
 }
@@ -135,11 +191,6 @@ struct Layout {
   Geometry g;
   std::string sizeFrom, eraseFrom, writeFrom;
 };
-
-bool Refuse(const std::string& where, const std::string& what, std::string* error) {
-  *error = where + ": " + what;
-  return false;
-}
 
 bool ParseMedium(const Settings& settings, Medium* medium, std::string* error) {
   if (!settings.Has("medium")) return true;
@@ -255,8 +306,13 @@ devmodel::DeviceNode* DeviceRoot::Image(const std::string& name, std::string* er
                  : g.medium == Medium::kNor ? SimKind::kNor
                  : row != rows_.end()       ? SimKind::kRam
                                             : SimKind::kEmmc;
-  return sim_.AddNode(devicePath, kind, std::move(storage), static_cast<uint32_t>(g.eraseSize),
-                      static_cast<uint32_t>(g.writeSize), static_cast<uint32_t>(g.oobSize));
+  devmodel::DeviceNode* node = sim_.AddNode(devicePath, kind, std::move(storage), static_cast<uint32_t>(g.eraseSize),
+                                            static_cast<uint32_t>(g.writeSize), static_cast<uint32_t>(g.oobSize));
+  bool readOnly = false;
+  if (!YesNo(settings, "readonly", &readOnly, error) || !ApplyFaults(settings, g, devicePath, sim_, error))
+    return nullptr;
+  if (readOnly) sim_.SetReadOnly(devicePath);
+  return node;
 }
 
 bool DeviceRoot::LoadNode(const Row& row, std::string* error) {
@@ -270,7 +326,7 @@ bool DeviceRoot::LoadNode(const Row& row, std::string* error) {
   const bool window = imageName != self;
   for (const auto& setting : settings.values) {
     const std::string& key = setting.first;
-    if (window && key != "image" && key != "offset")
+    if (window && key != "image" && key != "offset" && key != "readonly")
       return Refuse(settings.Where(key), key + " belongs in " + imageName + ".ini, the settings of the image", error);
     if (!window && key == "offset")
       return Refuse(settings.Where(key), "offset without image = another image to be a window of", error);
@@ -297,8 +353,11 @@ bool DeviceRoot::LoadNode(const Row& row, std::string* error) {
     sim_.ListInProcMtd(row.number, row.name, row.size, static_cast<uint32_t>(row.eraseSize));
     return true;
   }
+  bool readOnly = false;
+  if (!YesNo(settings, "readonly", &readOnly, error)) return false;
   devmodel::DeviceNode* node = sim_.AddPartition(row.number, row.name, "/dev/" + imageName, base, row.size);
   if (node != nullptr && node->kind == SimKind::kEmmc) node->kind = SimKind::kRam;
+  if (readOnly) sim_.SetReadOnly("/dev/" + self);
   return true;
 }
 
