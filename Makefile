@@ -1,6 +1,6 @@
 # Thin driver over the CMake presets. `make demo` runs the main job,
 # `make test` every test suite; both install what they need first.
-.PHONY: all deps build tool demo test check test-unit test-asan test-aarch64 test-fuzz test-system test-system-aarch64 bench clean
+.PHONY: all deps build tool demo test test-power-cut check test-unit test-asan test-aarch64 test-fuzz test-system test-system-aarch64 bench clean
 
 all: build
 
@@ -44,6 +44,11 @@ FUZZ_SECONDS ?= 20
 test-fuzz: deps
 	scripts/run-fuzz.sh $(FUZZ_SECONDS)
 
+# Power cuts at every step of whole-slot writes on copies of the example
+# device: nothing outside the slot changes, and a rerun ends right.
+test-power-cut: build
+	python3 bench/power_cut.py build/default
+
 # System tests: the library on a real kernel in a virtual machine (flash
 # simulators, an ATA disk, /dev/mem). Ends with its "N passed, N failed" line.
 test-system:
@@ -56,7 +61,7 @@ test-system-aarch64:
 
 # Everything CI runs; the system tests come last so that their summary lines
 # close the output.
-test: test-fuzz test-asan test-aarch64 test-unit test-system test-system-aarch64
+test: test-fuzz test-asan test-aarch64 test-unit test-power-cut test-system test-system-aarch64
 
 # Benchmarks (host, -O2): library rates beside their baselines; then the
 # size of the stripped device library.

@@ -453,6 +453,30 @@ bool EraseLocation(const Location& location, const std::string& text) {
   return FlashInterface::Instance()->EraseSlot(&location);
 }
 
+// The library's slot erase can report success for a chip that took nothing
+// (a NOR erase reports no failure): read the slot back. Slots of unknown
+// size are left as the library reported them.
+void CheckSlotErased(const Target& t, const std::string& command) {
+  if (!t.roomKnown || t.form == TargetForm::kNorAddress) return;
+  Target whole = t;
+  whole.offset = 0;
+  whole.location.offset = 0;
+  TargetStream back(whole, false);
+  std::vector<unsigned char> piece(std::min(kPiece, t.room + t.offset));
+  const unsigned long size = t.room + t.offset;
+  for (unsigned long done = 0; done < size;) {
+    const unsigned long n = std::min(kPiece, size - done);
+    if (!back.Read(piece.data(), n))
+      throw Failure(command + ": reading " + t.text + " back failed at " + Hex(done) + "; it may not be erased");
+    const auto left = std::find_if(piece.begin(), piece.begin() + static_cast<long>(n),
+                                   [](unsigned char b) { return b != kErasedByte; });
+    if (left != piece.begin() + static_cast<long>(n))
+      throw Failure(command + ": " + t.text + " is not erased at " +
+                    Hex(done + static_cast<unsigned long>(left - piece.begin())) + " after the erase");
+    done += n;
+  }
+}
+
 void EraseSlotOf(const Target& t, const std::string& command) {
   Location location;
   if (t.form == TargetForm::kLocation) {
@@ -464,6 +488,7 @@ void EraseSlotOf(const Target& t, const std::string& command) {
     location = LocationOf(arg);
   }
   if (!EraseLocation(location, t.text)) throw Failure(command + ": erasing " + t.text + " failed");
+  CheckSlotErased(t, command);
 }
 
 void RunWrite(const TransferArgs& args) {
@@ -561,6 +586,7 @@ void RunErase(const EraseArgs& args, bool sectorOnly) {
     if (t.location.hasOffset) throw UsageError(command + ": " + t.text + ": slots are erased whole, without an offset");
     Location location = LocationOf(t.location);
     ok = sectorOnly ? flash->EraseSector(&location) : EraseLocation(location, t.text);
+    if (ok && !sectorOnly) CheckSlotErased(t, command);
   }
   if (!ok) throw Failure(command + ": erasing " + t.text + " failed");
   if (Options().json)
