@@ -24,5 +24,7 @@ done
 echo "deps.sh: installing ${missing[*]}"
 SUDO=""; [ "$(id -u)" -ne 0 ] && SUDO=sudo
 export DEBIAN_FRONTEND=noninteractive
-$SUDO apt-get update -qq
-$SUDO apt-get install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
+# Another build on this machine may hold the package lock: wait for it.
+LOCK=(-o DPkg::Lock::Timeout=600)
+$SUDO apt-get "${LOCK[@]}" update -qq
+$SUDO apt-get "${LOCK[@]}" install -y -qq --no-install-recommends "${missing[@]}" >/dev/null
