@@ -2,6 +2,9 @@
 
 #include <sys/wait.h>
 
+#include <gtest/gtest.h>
+
+#include <algorithm>
 #include <cstdlib>
 
 #include "support/scratch_dir.h"
@@ -17,11 +20,16 @@ std::string Quoted(const std::string& text) {
   return quoted + "'";
 }
 
+// Every command, on every root and input the tests give it, ends by itself
+// within this time, and a failing one says why in fewer than kMaxErrorLines.
+constexpr int kMaxSeconds = 20;
+constexpr long kMaxErrorLines = 50;
+
 }  // namespace
 
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input) {
   ScratchDir scratch;
-  std::string command = "env -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL " + Quoted(STBPLAT_TOOL_PATH);
+  std::string command = "timeout -s KILL " + std::to_string(kMaxSeconds) + " env -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL " + Quoted(STBPLAT_TOOL_PATH);
   for (const std::string& arg : args) command += " " + Quoted(arg);
   command += " <" + Quoted(scratch.Write("stdin", input)) + " >" + Quoted(scratch / "stdout") +
              " 2>" + Quoted(scratch / "stderr");
@@ -32,6 +40,8 @@ ToolRun RunTool(const std::vector<std::string>& args, const std::string& input) 
   const std::vector<unsigned char> err = scratch.Read("stderr");
   run.out.assign(out.begin(), out.end());
   run.err.assign(err.begin(), err.end());
+  EXPECT_LT(run.exitCode, 128) << "ended by a signal, or ran past " << kMaxSeconds << " s";
+  EXPECT_LT(std::count(run.err.begin(), run.err.end(), '\n'), kMaxErrorLines);
   return run;
 }
 

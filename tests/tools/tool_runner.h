@@ -16,7 +16,9 @@ struct ToolRun {
 };
 
 // args reach the program as they are; input is its standard input.
-// STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared.
+// STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared. A run that ends by a signal,
+// takes more than 20 s or prints 50 lines or more to standard error fails the
+// calling test.
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input = "");
 
 }  // namespace test
