@@ -54,6 +54,7 @@ const Row kRows[] = {
     {{"crc16", "@/long.bin"}, 0, kExactOut, "0x6E80  @/long.bin\n"},  // KERMIT over 70000 'a'
     {{"crc32", "/nonexistent/file"}, 1, kErr, "/nonexistent/file: No such file or directory"},
     {{"crc32", "@"}, 1, kErr, "@: Is a directory"},
+    {{"record", "check", "/nonexistent/file"}, 1, kErr, "/nonexistent/file: No such file or directory (nor a"},
     // Hex dump: the library's lines, an offset past the end.
     {{"hexdump", "@/dump.bin"}, 0, kExactOut,
      "00000000  41 42 43 44 45 46 47 48 49 4A 4B 4C 4D 4E 4F 50      ABCDEFGHIJKLMNOP\n"

@@ -89,8 +89,8 @@ RecordSource LoadRecordSource(const std::string& source, unsigned long offset) {
   }
   LocationArg arg;
   if (!ParseLocationArg(source, "SOURCE", &arg))
-    throw UsageError("SOURCE '" + source +
-                     "': no such file, and not a location DEVICE.PARTITION.SLOT[+OFFSET]");
+    // A missing input file fails as it does in every other command.
+    throw Failure(source + ": No such file or directory (nor a location DEVICE.PARTITION.SLOT[+OFFSET])");
   if (offset != 0) {
     if (arg.hasOffset) throw UsageError("give the offset of '" + source + "' once, not also with --at");
     arg.offset = offset;
