@@ -75,9 +75,10 @@ void RunMtdInfo(const std::string& name) {
   Line("type", stbplat::mtdio::MtdTypeName(g.type));
   Line("size", Bytes(p.size));
   Line("erase blocks", std::to_string(blocks) + " of " + Bytes(g.eraseSize));
-  Line("page", std::to_string(g.pageSize) + " bytes");
+  Line("page", std::to_string(g.pageSize) + (g.pageSize == 1 ? " byte" : " bytes"));
   Line("OOB", std::to_string(g.oobSize) + " bytes a page");
-  Line("bad blocks", !badKnown ? "-" : bad.empty() ? "0" : std::to_string(bad.size()) + ": " + BlockList(bad, g.eraseSize));
+  Line("bad blocks",
+       !badKnown ? "-" : bad.empty() ? "0" : std::to_string(bad.size()) + ": " + BlockList(bad, g.eraseSize));
   Line("ECC", !eccKnown ? "-"
                         : std::to_string(ecc.corrected) + " corrected, " + std::to_string(ecc.failed) +
                               " failed; " + std::to_string(ecc.badBlocks) + " bad, " +

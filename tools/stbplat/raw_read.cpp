@@ -113,7 +113,8 @@ void RunRawRead(const MtdPartition& p, const RawReadArgs& args) {
   if (args.offset % page != 0)
     throw UsageError(what + ": raw reads start on a page (" + Hex(page) + " bytes); the page holding " +
                      Hex(args.offset) + " starts at " + Hex(args.offset - args.offset % page));
-  if (args.offset >= p.size) throw UsageError(what + ": offset " + Hex(args.offset) + " lies past the end (" + Hex(p.size) + ")");
+  if (args.offset >= p.size)
+    throw UsageError(what + ": offset " + Hex(args.offset) + " lies past the end (" + Hex(p.size) + ")");
   const std::vector<unsigned long> bad = BadBlocksFrom(node, p, block, args.offset);
   const unsigned long available = Available(p, block, args.offset, bad, args.method);
   const unsigned long length = args.hasLength ? args.length : available;
@@ -121,7 +122,8 @@ void RunRawRead(const MtdPartition& p, const RawReadArgs& args) {
     throw UsageError(what + ": --length " + Hex(length) + " runs past the end (" + std::to_string(available) +
                      " bytes left" + (args.method == BadBlockMethod::kSkip ? " in good blocks)" : ")"));
   if (args.oob && length % page != 0)
-    throw UsageError(what + ": --oob reads whole pages: --length " + Hex(length) + " is not a multiple of " + Hex(page));
+    throw UsageError(what + ": --oob reads whole pages: --length " + Hex(length) + " is not a multiple of " +
+                     Hex(page));
   if (args.output == "-" && isatty(STDOUT_FILENO))
     throw UsageError(std::string(kCommand) + ": give -o FILE (standard output is a terminal)");
 
