@@ -141,7 +141,8 @@ fi
 # runner reads the image back in host mode (host_checks.sh).
 STBPLAT=/opt/stbplat/bin/stbplat
 XFER_DISK=/realdev/vdb
-if want tool.mtd_list || want tool.nand_dump || want tool.whole_partition; then
+if want tool.mtd_list || want tool.nand_dump || want tool.whole_partition || want tool.raw_nand ||
+   want tool.mtd_info || want tool.mtd_erase; then
   nand_load badblocks=$BAD_AT_LOAD || fail tool "nandsim reload"
 fi
 if want tool.mtd_list; then
@@ -198,5 +199,105 @@ if want tool.whole_partition; then
   check $s "same bytes as nanddump" cmp /tmp/whole.dump /tmp/whole.read
   info "tool peak memory, whole ROOTFS.A ($good bytes): write --erase --verify $(peak w) KiB, read $(peak r) KiB"
   rm -f /tmp/whole /tmp/whole.read /tmp/whole.dump
+  scenario_end $s
+fi
+
+# KERNEL.A (mtd9) has block 2 bad from the factory. nandwrite puts 5 blocks
+# and a bit on it around the bad block; the tool's raw reads must give what
+# nanddump gives, with each of its bad-block methods, whole and from an
+# offset, by every name the partition has.
+if want tool.raw_nand; then
+  s=tool.raw_nand
+  dd if=/dev/urandom of=/tmp/raw.in bs=1000 count=$((5 * BLOCK / 1000 + 1)) 2>/dev/null
+  check $s "flash_erase" flash_erase -q /dev/mtd9 0 0
+  check $s "nandwrite" nandwrite -q -p /dev/mtd9 /tmp/raw.in
+  check $s "nanddump --oob" nanddump -q --oob -f /tmp/nd.default /dev/mtd9
+  check $s "flash read --raw --oob" $STBPLAT flash read --raw --oob --mtd mtd9 -o /tmp/sp.default
+  check $s "same as nanddump --oob" cmp /tmp/nd.default /tmp/sp.default
+  for bb in skipbad padbad dumpbad; do
+    check $s "nanddump --bb=$bb" nanddump -q --oob --bb=$bb -f /tmp/nd.$bb /dev/mtd9
+    check $s "flash read --bb=$bb" $STBPLAT flash read --oob --bb=$bb NAND0.KERNEL.A -o /tmp/sp.$bb
+    check $s "same as nanddump --bb=$bb" cmp /tmp/nd.$bb /tmp/sp.$bb
+  done
+  check $s "nanddump -s -l" nanddump -q --oob -s $BLOCK -l $((2 * BLOCK)) -f /tmp/nd.range /dev/mtd9
+  check $s "flash read from an offset" $STBPLAT flash read --raw --oob --mtd flash1.KERNEL.A+$BLOCK \
+    -n $((2 * BLOCK)) -o /tmp/sp.range
+  check $s "same range as nanddump" cmp /tmp/nd.range /tmp/sp.range
+  check $s "nanddump without OOB" nanddump -q --bb=padbad -f /tmp/nd.data /dev/mtd9
+  check $s "flash read --raw" $STBPLAT flash read --raw --bb=padbad --mtd /dev/mtd9 -o /tmp/sp.data
+  check $s "same data as nanddump" cmp /tmp/nd.data /tmp/sp.data
+  $STBPLAT flash read --raw --oob --mtd mtd9 -o /tmp/sp.default 2>/tmp/sp.err
+  check $s "the bad block named" has 'bad block 2 (at 0x40000) skipped' /tmp/sp.err
+  rm -f /tmp/nd.* /tmp/sp.*
+  scenario_end $s
+fi
+
+# mtd info against mtdinfo: size, erase blocks, page and OOB size, bad blocks
+# (mtdinfo's map), writable or not, for NAND with and without bad blocks
+# and the NOR chip. BOOT.A's node is the kernel's read-only one, which
+# mtdinfo takes for another device (it finds a device by the node's minor
+# number): there only stbplat's own answer is checked.
+mtd_info_agrees() {  # NODE-NUMBER NAME-FOR-STBPLAT
+  mtdinfo -M /dev/mtd$1 >/tmp/mi 2>&1 && $STBPLAT mtd info "$2" >/tmp/si 2>&1 || return 1
+  cat /tmp/mi /tmp/si
+  mi_blocks=$(sed -n 's/^Amount of eraseblocks: *\([0-9]*\) (\([0-9]*\) bytes.*/\1 \2/p' /tmp/mi)
+  si_blocks=$(sed -n 's/^  erase blocks *\([0-9]*\) of.*/\1/p' /tmp/si)
+  si_size=$(sed -n 's/^  size *\([0-9]*\) bytes.*/\1/p' /tmp/si)
+  mi_page=$(sed -n 's/^Minimum input\/output unit size: *\([0-9]*\) byte.*/\1/p' /tmp/mi)
+  si_page=$(sed -n 's/^  page *\([0-9]*\) byte.*/\1/p' /tmp/si)
+  # mtdinfo has no OOB line for a device without OOB bytes.
+  mi_oob=$(sed -n 's/^OOB size: *\([0-9]*\) bytes.*/\1/p' /tmp/mi)
+  mi_oob=${mi_oob:-0}
+  si_oob=$(sed -n 's/^  OOB *\([0-9]*\) bytes.*/\1/p' /tmp/si)
+  mi_bad=$(grep -o '[0-9]*: *[0-9a-fA-Fx]* *BAD' /tmp/mi | sed 's/:.*//' | tr '\n' ' ')
+  si_bad=$(sed -n 's/^  bad blocks *[0-9]*:* *//p' /tmp/si | sed 's/ (at [0-9a-fA-Fx]*),* */ /g')
+  [ "$si_bad" = 0 ] && si_bad=
+  mi_writable=$(sed -n 's/^Device is writable: *//p' /tmp/mi)
+  si_writable=$(sed -n 's/^  writable *\([a-z]*\).*/\1/p' /tmp/si)
+  echo "mtdinfo: $mi_blocks, page $mi_page, OOB $mi_oob, bad [$mi_bad], writable $mi_writable"
+  echo "stbplat: $si_blocks $si_size, page $si_page, OOB $si_oob, bad [$si_bad], writable $si_writable"
+  [ "$mi_writable" = true ] && mi_writable=yes || mi_writable=no
+  [ "$mi_blocks" = "$si_blocks $si_size" ] && [ "$mi_page" = "$si_page" ] && [ "$mi_oob" = "$si_oob" ] &&
+    [ "$(echo $mi_bad)" = "$(echo $si_bad)" ] && [ "$mi_writable" = "$si_writable" ]
+}
+if want tool.mtd_info; then
+  s=tool.mtd_info
+  check $s "KERNEL.A by slot name" mtd_info_agrees 9 NAND0.KERNEL.A
+  check $s "KERNEL.B by node" mtd_info_agrees 10 mtd10
+  check $s "USER.A by kernel name" mtd_info_agrees 13 flash1.USER.A
+  check $s "NOR chip" mtd_info_agrees 8 NOR0
+  $STBPLAT mtd info nor0.boot.a >/tmp/si 2>&1; cat /tmp/si
+  check $s "read-only BOOT.A" has 'writable *no (/dev/mtd0 opens for reading only)' /tmp/si
+  check $s "BOOT.A blocks" has 'erase blocks *8 of 65536 bytes' /tmp/si
+  $STBPLAT mtd info mtd9 >/tmp/si 2>&1
+  check $s "kernel name and node" sh -c "grep -q 'kernel name *flash1.KERNEL.A' /tmp/si && grep -q 'node */dev/mtd9' /tmp/si"
+  check $s "ECC counters" has 'ECC *[0-9]* corrected, [0-9]* failed; 1 bad' /tmp/si
+  scenario_end $s
+fi
+
+# Erasing by the kernel's offsets: blocks 1 to 3 of KERNEL.A around its bad
+# block 2, then the whole NOR chip.
+if want tool.mtd_erase; then
+  s=tool.mtd_erase
+  dd if=/dev/urandom of=/tmp/er.in bs=$BLOCK count=5 2>/dev/null
+  check $s "flash_erase" flash_erase -q /dev/mtd9 0 0
+  check $s "nandwrite" nandwrite -q -p /dev/mtd9 /tmp/er.in
+  check $s "refused without --yes" sh -c "! $STBPLAT flash erase --mtd mtd9+$BLOCK -n $((3 * BLOCK))"
+  check $s "refused off a block" sh -c "! $STBPLAT flash erase --mtd mtd9+$PAGE -n $BLOCK --yes"
+  $STBPLAT flash erase --mtd mtd9+$BLOCK -n $((3 * BLOCK)) --yes 2>/tmp/er.out; echo "exit $?" >>/tmp/er.out
+  cat /tmp/er.out
+  check $s "range erased" has 'erased 2 blocks of mtd9+131072 (/dev/mtd9, 0x20000 to 0x80000); skipped bad block 2 (at 0x40000)' /tmp/er.out
+  check $s "exit 0" has 'exit 0' /tmp/er.out
+  check $s "nanddump" nanddump -q --bb=padbad -l $((5 * BLOCK)) -f /tmp/er.dump /dev/mtd9
+  head -c $BLOCK /dev/zero | tr '\0' '\377' >/tmp/er.ff
+  for b in 1 2 3; do
+    check $s "block $b erased" sh -c "dd if=/tmp/er.dump bs=$BLOCK skip=$b count=1 2>/dev/null | cmp - /tmp/er.ff"
+  done
+  check $s "block 0 kept" cmp -n $BLOCK /tmp/er.dump /tmp/er.in
+  dd if=/tmp/er.in of=/tmp/er.in3 bs=$BLOCK skip=3 count=1 2>/dev/null
+  check $s "block 4 kept" sh -c "dd if=/tmp/er.dump bs=$BLOCK skip=4 count=1 2>/dev/null | cmp - /tmp/er.in3"
+  check $s "whole NOR chip" $STBPLAT flash erase --mtd flash0 --yes
+  check $s "NOR chip erased" sh -c "head -c 4194304 /dev/zero | tr '\0' '\377' | cmp - /dev/mtd8"
+  rm -f /tmp/er.*
   scenario_end $s
 fi

@@ -113,6 +113,21 @@ const Row kRows[] = {
     {{"--root", "@/device", "disk", "info"}, 0, kOut, "serial     Z9A1EXMP\nsize       931.5 GiB"},
     {{"--root", "@/device", "disk", "temp"}, 0, kExactOut, "36 C\n"},
     {{"--root", "@/device", "disk", "info", "sdb"}, 1, kErr, "cannot open /dev/sdb: No such file or directory"},
+    // Raw NAND: the whole chip as it was dumped (compared below), bad blocks
+    // named; good-block offsets say which bad blocks they passed over.
+    {{"--root", "@/device", "flash", "read", "--mtd", "flash1", "--oob", "--bb=dumpbad", "-o", "@/chip.oob"}, 0,
+     kExactErr, "flash read: flash1: bad blocks 2 (at 0x40000), 5 (at 0xA0000) read as they are\n"},
+    {{"--root", "@/device", "flash", "read", "--raw", "--bb=padbad", "--mtd", "mtd7+0x40000", "-n", "4", "-o", "-"},
+     0, kExactOut, "\xFF\xFF\xFF\xFF"},
+    {{"--root", "@/device", "flash", "read", "--mtd", "NAND0...+0x40000", "-n", "4", "-o", "-"}, 0, kErr,
+     "NAND0...+0x40000: NAND offsets count good blocks only: skipped bad block 2 (at 0x40000)\n"},
+    // MTD detail, by kernel name, node and chip.
+    {{"--root", "@/device", "mtd", "info", "flash1.KERNEL.A"}, 0, kOut,
+     "mtd5: NAND0.KERNEL.A\n  kernel name   flash1.KERNEL.A\n  node          /dev/mtd5\n  type          nand\n"},
+    {{"--root", "@/device", "mtd", "info", "mtd7"}, 0, kOut,
+     "  page          2048 bytes\n  OOB           64 bytes a page\n  bad blocks    2: 2 (at 0x40000), 5 (at 0xA0000)\n"
+     "  ECC           0 corrected, 0 failed; 2 bad, 0 bad-block-table blocks\n  writable      yes\n"},
+    {{"--root", "@/device", "flash", "read", "--mtd", "nand0.kernel.a", "-n", "4", "-o", "-"}, 0, kExactOut, "VERS"},
     // ROOTFS.A starts on a bad block: the record comes from the next one.
     {{"--root", "@/device", "record", "show", "NAND0.ROOTFS.A"}, 0, kOut, "root file system 2026.11b"},
     {{"--root", "@/device", "record", "show", "EMMC0.APPS.B"}, 0, kOut, "applications 1.3c"},
@@ -159,6 +174,21 @@ const Row kRows[] = {
     // A page programmed again fails ECC; -q keeps the library's message back, the tool's own error stays.
     {{"-q", "--root", "@/device", "flash", "write", "NAND0.KERNEL.A", "@/dump.bin", "--verify", "--yes"}, 1,
      kExactErr, "stbplat: flash write --verify: NAND0.KERNEL.A: reading back failed at 0x0\n"},
+    // Erasing blocks by the kernel's offsets, then the whole chip; a raw
+    // write of part of a page needs --pad, and starts past a bad block.
+    {{"--root", "@/device", "flash", "erase", "--mtd", "mtd5+0x800", "-n", "0x20000", "--yes"}, 2, kErr,
+     "is not whole 0x20000-byte erase blocks (the block holding the offset starts at 0x0)"},
+    {{"--root", "@/device", "flash", "erase", "--mtd", "NAND0.KERNEL.A+0x20000", "-n", "0x40000", "--yes"}, 0,
+     kExactErr, "erased 1 block of NAND0.KERNEL.A+0x20000 (/dev/mtd5, 0x20000 to 0x60000); skipped bad block 1 (at "
+     "0x20000)\n"},
+    {{"--root", "@/device", "flash", "erase", "--mtd", "flash1", "--yes"}, 0, kExactErr,
+     "erased 6 blocks of flash1 (/dev/mtd7, 0x0 to 0x100000); skipped bad blocks 2 (at 0x40000), 5 (at 0xA0000)\n"},
+    {{"--root", "@/device", "flash", "write", "--raw", "--mtd", "mtd7+0x40000", "@/dump.bin", "--yes"}, 2, kErr,
+     "(19 bytes) is not whole 0x800-byte pages; pass --pad"},
+    {{"--root", "@/device", "flash", "write", "--raw", "--pad", "--mtd", "mtd7+0x40000", "@/dump.bin", "--yes"}, 0,
+     kErr, "mtd7+0x40000: skipped bad block 2 (at 0x40000)\n"},
+    {{"--root", "@/device", "flash", "read", "--raw", "--mtd", "flash1+0x60000", "-n", "20", "-o", "-"}, 0, kExactOut,
+     std::string("ABCDEFGHIJKLMNOPQ\0\x7f\xFF", 20)},
 };
 
 std::string Expand(std::string text, const std::string& dir) {
@@ -197,6 +227,7 @@ TEST(Commands, AnswerEachRow) {
   const std::vector<unsigned char> before = dir.Read(kNor);
   const std::vector<unsigned char> after = dir.Read("device/dev/mtd8");
   EXPECT_TRUE(std::equal(before.begin(), before.begin() + 0x30000, after.begin()));  // up to PANEL.A
+  EXPECT_EQ(dir.Read(kExample + "/dev/mtd7"), dir.Read("chip.oob"));
 }
 
 TEST(ExampleDevice, CheckedInFilesAreWhatTheGeneratorWrites) {

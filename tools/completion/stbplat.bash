@@ -7,7 +7,7 @@ _stbplat() {
   # The command words typed so far, without options and their values.
   for ((i = 1; i < COMP_CWORD; i++)); do
     case ${COMP_WORDS[i]} in
-      --root | -o | --output | --at | --type | -n | -s | --length | --offset | --indent) ((i++)) ;;
+      --root | -o | --output | --at | --type | -n | -s | --length | --offset | --indent | --bb) ((i++)) ;;
       -*) ;;
       *) words+=("${COMP_WORDS[i]}") ;;
     esac
@@ -15,7 +15,13 @@ _stbplat() {
   case ${COMP_WORDS[COMP_CWORD - 1]} in
     --root) COMPREPLY=($(compgen -d -- "$cur")); return ;;
     -o | --output) COMPREPLY=($(compgen -f -- "$cur")); return ;;
+    --bb) COMPREPLY=($(compgen -W "skipbad padbad dumpbad" -- "$cur")); return ;;
   esac
+  # --bb=METHOD in one word.
+  if [[ $cur == --bb=* ]]; then
+    COMPREPLY=($(compgen -P --bb= -W "skipbad padbad dumpbad" -- "${cur#--bb=}"))
+    return
+  fi
   help=$("${COMP_WORDS[0]}" "${words[@]}" --help 2>/dev/null) || return
   local candidates=()
   while IFS= read -r line; do

@@ -2,6 +2,9 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstring>
+
+#include "image_storage.h"
 
 namespace stbplat {
 namespace devmodel {
@@ -18,6 +21,10 @@ constexpr size_t kProgramPiece = 64 * 1024;
 constexpr uint32_t kSeedStep = 0x9E3779B9u;
 constexpr uint32_t kLcgMultiplier = 1103515245u;
 constexpr uint32_t kLcgIncrement = 12345u;
+// The MTD character device takes OOB requests of at most this many bytes.
+constexpr size_t kMaxOobRequest = 4096;
+// What marking a block bad writes into its marker byte.
+constexpr uint8_t kBadMarker = 0x00;
 
 bool AllErased(const uint8_t* bytes, size_t n) {
   return std::all_of(bytes, bytes + n, [](uint8_t b) { return b == kErasedByte; });
@@ -167,6 +174,34 @@ int DeviceNode::EraseBlock(uint64_t block) {
 int DeviceNode::GetBadBlock(uint64_t offset, bool* bad) const {
   if (offset >= Size()) return EINVAL;
   *bad = kind == SimKind::kNand && IsBadBlock(offset);
+  return 0;
+}
+
+int DeviceNode::ReadOob(uint64_t offset, void* buffer, size_t length) {
+  if (kind != SimKind::kNand || oobSize == 0) return EOPNOTSUPP;
+  const uint64_t within = offset % writeSize;
+  if (length > kMaxOobRequest || offset >= Size() || within >= oobSize || (within != 0 && length > oobSize - within))
+    return EINVAL;
+  const uint64_t first = PageOf(offset);
+  const uint64_t pages = (within + length + oobSize - 1) / oobSize;
+  if (pages > (Size() - first) / writeSize) return EINVAL;
+  std::vector<uint8_t> oob(oobSize);
+  Geometry geometry;
+  geometry.writeSize = writeSize;
+  auto* out = static_cast<uint8_t*>(buffer);
+  for (uint64_t page = first, skip = within; length > 0; page += writeSize, skip = 0) {
+    int error = storage->ReadOob(page, oob.data(), oob.size());
+    if (error == EOPNOTSUPP) {
+      std::fill(oob.begin(), oob.end(), kErasedByte);
+      if (page == BlockOf(page) && IsBadBlock(page)) oob[BadMarkerByte(geometry)] = kBadMarker;
+    } else if (error != 0) {
+      return error;
+    }
+    const size_t n = std::min<size_t>(length, oobSize - skip);
+    std::memcpy(out, oob.data() + skip, n);
+    out += n;
+    length -= n;
+  }
   return 0;
 }
 

@@ -40,6 +40,11 @@
 //   twice.
 // - Writes past the end are cut at the end; a write starting at the end
 //   fails with ENOSPC. A read at the end returns 0 bytes.
+// - OOB reads (MEMREADOOB, MEMREADOOB64) are NAND's (EOPNOTSUPP elsewhere),
+//   at most 4096 bytes a request, from an offset in a page's OOB area on
+//   through the following pages. A dump with OOB bytes gives its own; any
+//   other store shows erased OOB bytes, with the bad-block marker cleared in
+//   the first page of a bad block, where marking a block bad writes it.
 // eMMC block nodes and plain files take writes as they come; files grow.
 #ifndef STBPLAT_DEVMODEL_DEVICE_NODE_H
 #define STBPLAT_DEVMODEL_DEVICE_NODE_H
@@ -110,6 +115,8 @@ struct DeviceNode {
   // The MTD requests: 0 or an errno value.
   int Erase(uint64_t start, uint64_t length);
   int GetBadBlock(uint64_t offset, bool* bad) const;
+  // OOB bytes from `offset` (a page's start plus an offset in its OOB area).
+  int ReadOob(uint64_t offset, void* buffer, size_t length);
   int SetBadBlock(uint64_t offset);
   mtd_info_user Info() const;
   mtd_ecc_stats Stats() const;

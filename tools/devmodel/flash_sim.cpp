@@ -622,6 +622,9 @@ ssize_t FlashSim::Write(int fd, const void* data, size_t count) {
 int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
   SimCall specific = request == MEMGETINFO        ? SimCall::kMemGetInfo
                      : request == MEMERASE        ? SimCall::kMemErase
+                     : request == MEMERASE64      ? SimCall::kMemErase
+                     : request == MEMREADOOB      ? SimCall::kMemReadOob
+                     : request == MEMREADOOB64    ? SimCall::kMemReadOob
                      : request == ECCGETSTATS     ? SimCall::kEccGetStats
                      : request == MEMGETBADBLOCK  ? SimCall::kMemGetBadBlock
                      : request == MEMSETBADBLOCK  ? SimCall::kMemSetBadBlock
@@ -648,10 +651,25 @@ int FlashSim::Ioctl(int fd, unsigned long request, void* argument) {
       *static_cast<mtd_ecc_stats*>(argument) = node->Stats();
       return 0;
     case SimCall::kMemErase: {
-      const auto* region = static_cast<const erase_info_user*>(argument);
-      error = node->Erase(region->start, region->length);
+      if (request == MEMERASE64) {
+        const auto* region = static_cast<const erase_info_user64*>(argument);
+        error = node->Erase(region->start, region->length);
+      } else {
+        const auto* region = static_cast<const erase_info_user*>(argument);
+        error = node->Erase(region->start, region->length);
+      }
       break;
     }
+    case SimCall::kMemReadOob:
+      // The kernel answers with the count read in the request's length.
+      if (request == MEMREADOOB64) {
+        auto* request64 = static_cast<mtd_oob_buf64*>(argument);
+        error = node->ReadOob(request64->start, reinterpret_cast<void*>(request64->usr_ptr), request64->length);
+      } else {
+        auto* request32 = static_cast<mtd_oob_buf*>(argument);
+        error = node->ReadOob(request32->start, request32->ptr, request32->length);
+      }
+      break;
     case SimCall::kMemGetBadBlock: {
       bool bad = false;
       error = node->GetBadBlock(static_cast<uint64_t>(*static_cast<const loff_t*>(argument)), &bad);

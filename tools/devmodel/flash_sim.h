@@ -28,7 +28,7 @@ namespace devmodel {
 // the MTD requests can also be chosen one by one. kAny matches every call.
 enum class SimCall {
   kAny, kOpen, kClose, kLseek, kRead, kWrite, kIoctl, kMemGetInfo, kMemErase, kEccGetStats,
-  kMemGetBadBlock, kMemSetBadBlock, kFopen, kFclose, kFread, kFwrite, kFseek, kFgets, kMmap,
+  kMemGetBadBlock, kMemSetBadBlock, kMemReadOob, kFopen, kFclose, kFread, kFwrite, kFseek, kFgets, kMmap,
   kUnlink,
   kCount,  // the number of kinds
 };

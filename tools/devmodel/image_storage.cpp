@@ -52,6 +52,11 @@ class ImageStorage : public SimStorage {
   std::vector<uint64_t> BadBlocks() const override { return {bad_.begin(), bad_.end()}; }
   int SaveBadBlock(uint64_t offset) override;
   bool ReadOnly() const override { return readOnly_; }
+  int ReadOob(uint64_t page, void* buffer, size_t length) const override {
+    if (!hasOob_) return SimStorage::ReadOob(page, buffer, length);
+    const off_t where = static_cast<off_t>(FileOffset(page) + geometry_.writeSize);
+    return pread(fd_, buffer, length, where) == static_cast<ssize_t>(length) ? 0 : EIO;
+  }
 
  private:
   uint64_t FileOffset(uint64_t dataOffset) const {

@@ -48,6 +48,9 @@ class WindowStorage : public SimStorage {
   int Erase(uint64_t offset, uint64_t length) override { return whole_.Erase(offset_ + offset, length); }
   int SaveBadBlock(uint64_t offset) override { return whole_.SaveBadBlock(offset_ + offset); }
   bool ReadOnly() const override { return whole_.ReadOnly(); }
+  int ReadOob(uint64_t page, void* buffer, size_t length) const override {
+    return whole_.ReadOob(offset_ + page, buffer, length);
+  }
 
  private:
   SimStorage& whole_;
@@ -65,6 +68,8 @@ int SimStorage::Erase(uint64_t offset, uint64_t length) {
   }
   return 0;
 }
+
+int SimStorage::ReadOob(uint64_t, void*, size_t) const { return EOPNOTSUPP; }
 
 std::unique_ptr<SimStorage> MakeMemoryStorage(uint64_t size, uint8_t fill) {
   return std::make_unique<MemoryStorage>(size, fill);

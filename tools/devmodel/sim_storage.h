@@ -32,6 +32,10 @@ class SimStorage {
   virtual int SaveBadBlock(uint64_t) { return 0; }
   // True when the bytes can only be read (the node refuses every change).
   virtual bool ReadOnly() const { return false; }
+  // The OOB bytes kept behind the page starting at `page`: a dump taken with
+  // them keeps them; other stores keep none (EOPNOTSUPP), and the node makes
+  // up what a kernel would show for them.
+  virtual int ReadOob(uint64_t page, void* buffer, size_t length) const;
 };
 
 constexpr uint8_t kErasedByte = 0xFF;

@@ -1,8 +1,10 @@
 // mtd list, and flash read | write | erase | erase-sector. A target is a
 // component location (DEVICE.PARTITION.SLOT[+OFFSET], resolved through the
 // memory map like the library's streams do), an MTD partition by name
-// (--mtd NAME[+OFFSET], as mtd list shows it), or a physical NOR address
-// (0xE0010000).
+// (--mtd NAME[+OFFSET], NAME as mtd_partition_arg.h takes it), or a
+// physical NOR address (0xE0010000). NAND offsets count good blocks only,
+// as the flash layer does, unless --raw asks for the kernel's (physical)
+// offsets.
 #include <CLI/CLI.hpp>
 
 #include <algorithm>
@@ -19,8 +21,12 @@
 #include <vector>
 
 #include "actions.h"
+#include "bad_blocks.h"
 #include "device_table.h"
 #include "location_arg.h"
+#include "mtd_erase.h"
+#include "mtd_partition_arg.h"
+#include "raw_read.h"
 #include "output.h"
 #include "stbplat/extruder.h"
 #include "stbplat/flash_interface.h"
@@ -54,6 +60,9 @@ struct Target {
   bool roomKnown = false;
   Medium medium = Medium::kOther;
   unsigned long pageSize = 0;  // NAND writes start on a page
+  // The MTD partition the target lies in, when it has one of its own.
+  MtdPartition partition;
+  bool hasPartition = false;
 };
 
 // What a transfer can reach: NAND transfers skip bad blocks, so a NAND
@@ -68,6 +77,8 @@ unsigned long Capacity(const MtdPartition& p) {
 void SetRoom(Target& t, const MtdPartition& p) {
   t.medium = p.medium;
   t.pageSize = p.pageSize;
+  t.partition = p;
+  t.hasPartition = true;
   if (t.offset > Capacity(p)) return;
   t.room = Capacity(p) - t.offset;
   t.roomKnown = true;
@@ -88,9 +99,8 @@ Target ParseTarget(const std::string& text, bool mtd, const std::string& command
     size_t plus = text.find('+');
     t.mtdName = text.substr(0, plus);
     if (plus != std::string::npos) t.offset = ParseNumber(text.substr(plus + 1), command + " --mtd offset");
-    const MtdPartition* p = FindPartition(table, t.mtdName);
-    if (p == nullptr)
-      throw UsageError(command + ": --mtd " + t.mtdName + ": no such partition (see stbplat mtd list)");
+    const MtdPartition* p = &RequireMtdPartition(table, t.mtdName, command + " --mtd");
+    t.mtdName = p->name;
     SetRoom(t, *p);
     if (!t.roomKnown) throw UsageError(command + ": offset " + Hex(t.offset) + " lies past the end of " + t.mtdName);
     return t;
@@ -398,10 +408,51 @@ struct TransferArgs {
   bool verify = false;
   unsigned long length = 0;
   bool hasLength = false;
+  // Physical offsets, bad blocks as --bb says, OOB bytes; a padded last page.
+  bool raw = false;
+  std::string badBlocks;
+  bool oob = false;
+  bool pad = false;
 };
+
+// Says which bad blocks a NAND transfer passed over: by good-block offset
+// every one before its end moved its bytes; from a raw offset, those from
+// the block it started in.
+void NoteSkippedBadBlocks(const std::string& what, const Target& t, unsigned long length, bool raw,
+                          unsigned long rawOffset) {
+  if (t.medium != Medium::kNand || !t.hasPartition) return;
+  const unsigned long block = t.partition.eraseSize;
+  std::vector<unsigned long> passed = PassedBadBlocks(t.partition.badBlocks, block, t.offset, length);
+  if (raw) passed.erase(passed.begin(), std::lower_bound(passed.begin(), passed.end(), rawOffset - rawOffset % block));
+  if (!passed.empty())
+    std::cerr << what << ": " << t.text << ": " << (raw ? "" : "NAND offsets count good blocks only: ") << "skipped "
+              << BadBlockText(passed, block) << "\n";
+}
+
+// --raw, --bb and --oob read by the kernel's offsets, from a partition.
+void RequireRawTarget(const Target& t, const std::string& command) {
+  if (!t.hasPartition)
+    throw UsageError(command + ": --raw, --bb and --oob read an MTD partition: give --mtd NAME or a slot with a "
+                     "partition of its own, not " + t.text);
+}
+
+void RunRawReadOf(const Target& t, const TransferArgs& args) {
+  RequireRawTarget(t, "flash read");
+  RawReadArgs raw;
+  raw.label = t.text;
+  raw.offset = t.offset;
+  raw.length = args.length;
+  raw.hasLength = args.hasLength;
+  raw.oob = args.oob;
+  raw.output = args.file.empty() ? "-" : args.file;
+  if (!args.badBlocks.empty() && !ParseBadBlockMethod(args.badBlocks, &raw.method))
+    throw UsageError("flash read: --bb " + args.badBlocks + ": expected skipbad, padbad or dumpbad");
+  RunRawRead(t.partition, raw);
+}
 
 void RunRead(const TransferArgs& args) {
   Target t = ParseTarget(args.target, args.mtd, "flash read");
+  if (args.raw || args.oob || !args.badBlocks.empty()) return RunRawReadOf(t, args);
   unsigned long length = args.length;
   if (args.hasLength) {
     if (t.roomKnown && length > t.room)
@@ -428,6 +479,7 @@ void RunRead(const TransferArgs& args) {
     progress.Update(done);
   }
   sink.Close();
+  NoteSkippedBadBlocks("flash read", t, length, false, 0);
 }
 
 // eMMC has no erase: a slot is filled with the erased value, piece by
@@ -491,8 +543,27 @@ void EraseSlotOf(const Target& t, const std::string& command) {
   CheckSlotErased(t, command);
 }
 
+// --raw: the target's offset is the kernel's; the write starts there (at
+// the next good block when it starts a bad one) and, as every NAND write
+// here, passes over the bad blocks it meets.
+void ToGoodBlockOffset(Target& t) {
+  RequireRawTarget(t, "flash write");
+  if (t.medium != Medium::kNand) return;
+  const MtdPartition& p = t.partition;
+  unsigned long logical = 0;
+  if (!LogicalOffset(p.badBlocks, p.eraseSize, t.offset, &logical))
+    throw UsageError("flash write: " + t.text + ": " + Hex(t.offset) + " lies inside bad block " +
+                     std::to_string(t.offset / p.eraseSize));
+  t.offset = logical;
+  t.location.offset = logical;
+  t.roomKnown = false;
+  SetRoom(t, p);
+}
+
 void RunWrite(const TransferArgs& args) {
   Target t = ParseTarget(args.target, args.mtd, "flash write");
+  const unsigned long rawOffset = t.offset;
+  if (args.raw) ToGoodBlockOffset(t);
   if (t.medium == Medium::kNand && t.pageSize != 0 && t.offset % t.pageSize != 0)
     throw UsageError("flash write: " + t.text + ": NAND is written from the start of a page (" +
                      Hex(t.pageSize) + " bytes); the page holding the offset starts at +" +
@@ -500,7 +571,8 @@ void RunWrite(const TransferArgs& args) {
   CommandFile input(args.file, false);
   // Before an erase the whole input must be known to fit: standard input is
   // taken into a temporary file first, no further than the room it has.
-  const bool spooled = args.erase && input.IsStream() && t.roomKnown;
+  // So is a raw write's, to know that it is whole pages.
+  const bool spooled = (args.erase || (args.raw && !args.pad)) && input.IsStream() && t.roomKnown;
   if (spooled) input.Spool(t.room + 1);
   unsigned long size = 0;
   bool sized = input.Size(&size);
@@ -510,6 +582,11 @@ void RunWrite(const TransferArgs& args) {
   if (sized && t.roomKnown && size > t.room)
     throw UsageError("flash write: " + args.file + " (" + std::to_string(size) + " bytes) does not fit in " +
                      t.text + " (" + std::to_string(t.room) + " bytes left)");
+  // A raw NAND write is whole pages unless told to pad, as nandwrite is.
+  if (args.raw && !args.pad && t.medium == Medium::kNand && t.pageSize != 0 && (sized || spooled) &&
+      size % t.pageSize != 0)
+    throw UsageError("flash write --raw: " + args.file + " (" + std::to_string(size) + " bytes) is not whole " +
+                     Hex(t.pageSize) + "-byte pages; pass --pad to fill the last page with 0xFF");
   RequireYes(args.yes, "flash write", t);
   if (args.erase) {
     if (t.form == TargetForm::kNorAddress) throw UsageError("flash write --erase: erase by address with flash erase");
@@ -520,10 +597,12 @@ void RunWrite(const TransferArgs& args) {
     PrintJson({{"target", t.text}, {"written", written}, {"verified", args.verify}, {"erasedFirst", args.erase}});
   else
     std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << "\n";
+  NoteSkippedBadBlocks("flash write", t, written, args.raw, rawOffset);
 }
 
 struct EraseArgs {
   std::string target;
+  bool mtd = false;
   bool yes = false;
   unsigned long length = 0;
   bool hasLength = false;
@@ -564,8 +643,22 @@ void CheckErased(const std::string& command, unsigned long address, unsigned lon
   }
 }
 
+// flash erase --mtd NAME[+OFFSET]: erase blocks by the kernel's offsets.
+void RunEraseByMtd(const EraseArgs& args) {
+  const DeviceTable table = LoadDeviceTable(false);
+  const size_t plus = args.target.find('+');
+  RangeEraseArgs range;
+  range.label = args.target;
+  if (plus != std::string::npos) range.offset = ParseNumber(args.target.substr(plus + 1), "flash erase --mtd offset");
+  range.length = args.length;
+  range.hasLength = args.hasLength;
+  range.yes = args.yes;
+  RunMtdErase(RequireMtdPartition(table, args.target.substr(0, plus), "flash erase --mtd"), range);
+}
+
 void RunErase(const EraseArgs& args, bool sectorOnly) {
   const std::string command = sectorOnly ? "flash erase-sector" : "flash erase";
+  if (args.mtd && !sectorOnly) return RunEraseByMtd(args);
   Target t = ParseTarget(args.target, false, command);
   FlashInterface* flash = FlashInterface::Instance();
   if (t.form == TargetForm::kNorAddress) {
@@ -627,12 +720,16 @@ void RegisterFlashCommands(CLI::App& app) {
   mtd->require_subcommand(1);
   CLI::App* list = mtd->add_subcommand("list", "Partitions with sizes, erase and page sizes and bad-block counts");
   SetAction(list, []() { RunMtdList(); });
+  RegisterMtdInfoCommand(*mtd);
 
   CLI::App* flash = app.add_subcommand(
       "flash",
       "Read, write and erase flash by location (DEVICE.PARTITION.SLOT[+OFFSET]), MTD name (--mtd) or NOR address");
   flash->require_subcommand(1);
-  const std::string targetHelp = "DEVICE.PARTITION.SLOT[+OFFSET], a NOR address, or with --mtd an MTD name[+OFFSET]";
+  const std::string targetHelp =
+      "DEVICE.PARTITION.SLOT[+OFFSET], a NOR address, or with --mtd an MTD partition[+OFFSET] (NAND0.KERNEL.A, "
+      "NAND0, mtd5 or flash1.KERNEL.A). NAND offsets count good blocks only (a bad block is skipped: with block 2 "
+      "bad, NAND0+0x40000 is block 3), unless --raw";
 
   static TransferArgs read;
   CLI::App* readCommand = flash->add_subcommand("read", "Copy bytes from flash to a file");
@@ -641,6 +738,16 @@ void RegisterFlashCommands(CLI::App& app) {
   AddNumberOption(readCommand, "-n,--length", &read.length, "Bytes to read (default: to the end of the partition)",
                   &read.hasLength);
   readCommand->add_flag("--mtd", read.mtd, "TARGET names an MTD partition");
+  readCommand->add_flag("--raw", read.raw,
+                        "The kernel's offsets (every block counts), as nanddump reads; bad blocks as --bb says");
+  readCommand->add_option("--bb", read.badBlocks,
+                          "Bad blocks with --raw: skipbad (left out; the default, as nanddump), padbad (0xFF in "
+                          "their place) or dumpbad (read as they are); implies --raw")
+      ->check(CLI::IsMember({kBadBlockMethodNames[0], kBadBlockMethodNames[1], kBadBlockMethodNames[2]}))
+      ->type_name("METHOD");
+  readCommand->add_flag("--oob", read.oob,
+                        "Each page followed by its OOB bytes (nanddump --oob's layout, which --root reads); "
+                        "implies --raw");
   SetAction(readCommand, []() { RunRead(read); });
 
   static TransferArgs write;
@@ -649,6 +756,12 @@ void RegisterFlashCommands(CLI::App& app) {
   writeCommand->add_option("TARGET", write.target, targetHelp)->required();
   writeCommand->add_option("FILE", write.file, "Input file (- for standard input)")->required();
   writeCommand->add_flag("--mtd", write.mtd, "TARGET names an MTD partition");
+  writeCommand->add_flag("--raw", write.raw,
+                         "TARGET's offset is the kernel's (every block counts), as nandwrite -s; the input must "
+                         "be whole pages unless --pad");
+  writeCommand->add_flag("--pad", write.pad,
+                         "Fill a last partial page with 0xFF, as nandwrite -p (writes by good-block offset "
+                         "always do)");
   writeCommand->add_flag("--erase", write.erase, "Erase the whole slot first");
   writeCommand->add_flag("--verify", write.verify,
                          "Read back what was written and compare (standard input: piece by piece)");
@@ -656,10 +769,16 @@ void RegisterFlashCommands(CLI::App& app) {
   SetAction(writeCommand, []() { RunWrite(write); });
 
   static EraseArgs erase;
-  CLI::App* eraseCommand = flash->add_subcommand("erase", "Erase a whole slot, or NOR bytes from an address");
-  eraseCommand->add_option("TARGET", erase.target, "DEVICE.PARTITION.SLOT or a NOR address")->required();
-  AddNumberOption(eraseCommand, "-n,--length", &erase.length, "Bytes to erase from a NOR address (whole sectors)",
-                  &erase.hasLength);
+  CLI::App* eraseCommand = flash->add_subcommand(
+      "erase", "Erase a whole slot, NOR bytes from an address, or with --mtd blocks of a partition or a whole chip");
+  eraseCommand->add_option("TARGET", erase.target,
+                           "DEVICE.PARTITION.SLOT, a NOR address, or with --mtd an MTD partition[+OFFSET]")
+      ->required();
+  eraseCommand->add_flag("--mtd", erase.mtd,
+                         "TARGET names an MTD partition; erase whole blocks from its offset (the kernel's: every "
+                         "block counts) to the end or --length, skipping and naming bad blocks, as flash_erase");
+  AddNumberOption(eraseCommand, "-n,--length", &erase.length,
+                  "Bytes to erase from a NOR address (whole sectors) or with --mtd (whole blocks)", &erase.hasLength);
   eraseCommand->add_flag("-y,--yes", erase.yes, "Confirm: change the device");
   SetAction(eraseCommand, []() { RunErase(erase, false); });
 

@@ -43,6 +43,8 @@ GlobalOptions& Options();
 // Each command group adds its subcommands to the top-level app.
 void RegisterRecordCommands(CLI::App& app);
 void RegisterFlashCommands(CLI::App& app);
+// mtd info, under the mtd group.
+void RegisterMtdInfoCommand(CLI::App& mtd);
 void RegisterMapCommand(CLI::App& app);
 void RegisterDiskCommands(CLI::App& app);
 void RegisterChecksumCommands(CLI::App& app);
