@@ -3,6 +3,7 @@
 #include <sys/wait.h>
 
 #include <cstdlib>
+#include <string>
 
 #include "support/scratch_dir.h"
 
@@ -17,11 +18,19 @@ std::string Quoted(const std::string& text) {
   return quoted + "'";
 }
 
+// No command may run away: one that still runs after this long is killed,
+// and its output files stop growing at this size (512-byte blocks), which
+// ends the program too.
+constexpr int kSecondsAllowed = 20;
+constexpr int kOutputBlocksAllowed = 16384;
+
 }  // namespace
 
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input) {
   ScratchDir scratch;
-  std::string command = "env -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL " + Quoted(STBPLAT_TOOL_PATH);
+  std::string command = "ulimit -f " + std::to_string(kOutputBlocksAllowed) +
+                        "; env -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL timeout -s KILL " +
+                        std::to_string(kSecondsAllowed) + " " + Quoted(STBPLAT_TOOL_PATH);
   for (const std::string& arg : args) command += " " + Quoted(arg);
   command += " <" + Quoted(scratch.Write("stdin", input)) + " >" + Quoted(scratch / "stdout") +
              " 2>" + Quoted(scratch / "stderr");

@@ -15,7 +15,8 @@ struct ToolRun {
   std::string err;
 };
 
-// args reach the program as they are; input is its standard input.
+// args reach the program as they are; input is its standard input. A run
+// is killed after 20 s or 8 MiB of output.
 // STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared.
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input = "");
 
