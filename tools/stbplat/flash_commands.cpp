@@ -23,6 +23,8 @@
 #include "device_table.h"
 #include "emmc_slot.h"
 #include "location_arg.h"
+#include "log_sink.h"
+#include "marked_bad.h"
 #include "output.h"
 #include "stbplat/extruder.h"
 #include "stbplat/flash_interface.h"
@@ -66,6 +68,7 @@ struct Target {
   unsigned long emmcPlace = 0;
   bool emmcNodeKnown = false;
   EmmcSlotNode emmcNode;
+  std::string nandPartition;  // the NAND partition written, by its name
 };
 
 // What a transfer can reach: NAND transfers skip bad blocks, so a NAND
@@ -80,6 +83,7 @@ unsigned long Capacity(const MtdPartition& p) {
 void SetRoom(Target& t, const MtdPartition& p) {
   t.medium = p.medium;
   t.pageSize = p.pageSize;
+  if (p.medium == Medium::kNand) t.nandPartition = p.name;
   if (t.offset > Capacity(p)) return;
   t.room = Capacity(p) - t.offset;
   t.roomKnown = true;
@@ -469,6 +473,24 @@ struct TransferArgs {
   bool hasLength = false;
 };
 
+// A piece that does not read (a NAND page failing its ECC check, the kernel's
+// EBADMSG) is read again page by page to name the page that fails; the
+// start of the piece when the target is not read by pages.
+unsigned long FirstUnreadablePage(const Target& t, unsigned long done, unsigned long n) {
+  const unsigned long start = (t.form == TargetForm::kNorAddress ? t.address : t.offset) + done;
+  if (t.medium != Medium::kNand || t.pageSize == 0) return start;
+  TargetStream probe(t, false);
+  if (!probe.ReadsByCall()) return start;
+  probe.Skip(done);
+  std::vector<unsigned char> page(t.pageSize);
+  QuietLog quiet(eLogModuleFlashAccess);  // the library said it once already
+  for (unsigned long at = 0; at < n; at += t.pageSize) {
+    const unsigned long position = probe.Position();
+    if (!probe.Read(page.data(), std::min(t.pageSize, n - at))) return position;
+  }
+  return start;
+}
+
 void RunRead(const TransferArgs& args) {
   Target t = ParseTarget(args.target, args.mtd, "flash read");
   unsigned long length = args.length;
@@ -491,7 +513,8 @@ void RunRead(const TransferArgs& args) {
   Progress progress("reading " + t.text, length);
   for (unsigned long done = 0; done < length;) {
     unsigned long n = std::min(kPiece, length - done);
-    if (!in.Read(piece.data(), n)) throw Failure("flash read: " + t.text + ": reading failed at " + Hex(in.Position()));
+    if (!in.Read(piece.data(), n))
+      throw Failure("flash read: " + t.text + ": reading failed at " + Hex(FirstUnreadablePage(t, done, n)));
     sink.Write(piece.data(), n);
     done += n;
     progress.Update(done);
@@ -567,15 +590,25 @@ void RunWrite(const TransferArgs& args) {
     throw UsageError("flash write: " + args.file + " (" + std::to_string(size) + " bytes) does not fit in " +
                      t.text + " (" + std::to_string(t.room) + " bytes left)");
   RequireYes(args.yes, "flash write", t);
-  if (args.erase) {
-    if (t.form == TargetForm::kNorAddress) throw UsageError("flash write --erase: erase by address with flash erase");
-    EraseSlotOf(t, "flash write --erase");
+  if (args.erase && t.form == TargetForm::kNorAddress)
+    throw UsageError("flash write --erase: erase by address with flash erase");
+  const MarkedBadWatch marks(t.nandPartition);
+  unsigned long written = 0;
+  try {
+    if (args.erase) EraseSlotOf(t, "flash write --erase");
+    written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0, args.erase);
+  } catch (const Failure& failure) {
+    throw Failure(failure.what() + marks.Note(false));
   }
-  unsigned long written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0, args.erase);
-  if (Options().json)
-    PrintJson({{"target", t.text}, {"written", written}, {"verified", args.verify}, {"erasedFirst", args.erase}});
-  else
-    std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << "\n";
+  if (Options().json) {
+    Json marked = Json::array();
+    for (unsigned long block : marks.Marked()) marked.push_back(block);
+    PrintJson({{"target", t.text}, {"written", written}, {"verified", args.verify}, {"erasedFirst", args.erase},
+               {"markedBad", marked}});
+  } else {
+    std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << marks.Note(true)
+              << "\n";
+  }
 }
 
 struct EraseArgs {
