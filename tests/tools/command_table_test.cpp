@@ -159,6 +159,21 @@ const Row kRows[] = {
     {{"--root", "@/device", "flash", "erase", "0xE0020000", "--length", "0x20000", "--yes"}, 2, kErr,
      "runs past the end of its partition (0x10000 bytes left)"},
     {{"--root", "@/device", "flash", "erase-sector", "EMMC0.APPS.B", "--yes"}, 2, kErr, "no erase sectors"},
+    // eMMC slots are written through their own rows, at the offset in the slot.
+    {{"--root", "@/device", "flash", "write", "EMMC0.APPS.B+0x7F010", "@/dump.bin", "--verify", "--yes"}, 0, kErr,
+     "wrote 19 bytes to EMMC0.APPS.B+0x7F010, verified"},
+    {{"--root", "@/device", "flash", "read", "EMMC0.APPS.B+0x7F010", "-n", "19", "-o", "-"}, 0, kExactOut,
+     std::string("ABCDEFGHIJKLMNOPQ\0\x7f", 19)},
+    // New roots: from a geometry (every slot writable), and from a box's dumps.
+    {{"root", "make", "@/made", "--nand", "1M,2048,64,128K", "--emmc", "1M", "--slot", "NAND0.KERNEL.A=512K",
+      "--slot", "EMMC0.APPS.A=512K"}, 0, kErr, "made @/made"},
+    {{"--root", "@/made", "flash", "write", "EMMC0.APPS.A+0x100", "@/dump.bin", "--verify", "--yes"}, 0, kErr,
+     "wrote 19 bytes to EMMC0.APPS.A+0x100, verified"},
+    {{"root", "make", "@/odd", "--emmc", "1M", "--slot", "EMMC0.APPS.A=1000"}, 2, kErr,
+     "the size must be whole 0x800-byte eMMC write units"},
+    {{"root", "make", "@/box", "--proc-mtd", "@/box-mtd", "--dump", "mtd0=@/device/dev/mtd7,2048,64", "--window",
+      "mtd1=mtd0+0x20000"}, 0, kErr, "made @/box"},
+    {{"--root", "@/box", "mtd", "list"}, 0, kOut, "mtd1   NAND0.KERNEL.A       NAND     512 KiB"},
     // A read from a slot that is not there leaves the output file alone.
     {{"--root", "@/device", "flash", "read", "NOR0.PANL.A", "-n", "16", "-o", "@/check.txt"}, 2, kErr, "PANL"},
     {{"crc32", "@/check.txt"}, 0, kExactOut, "0xCBF43926  @/check.txt\n"},
@@ -206,6 +221,8 @@ TEST(Commands, AnswerEachRow) {
   dir.Write("bad.ini", "[a]\nx = 1\n[broken\ny = 2\n");
   dir.Write("latin1.ini", "name = caf\xE9\n");
   dir.Write("altered.bin", Stream(true));
+  dir.Write("box-mtd", "dev:    size   erasesize  name\nmtd0: 00100000 00020000 \"flash1\"\n"
+                       "mtd1: 00080000 00020000 \"flash1.KERNEL.A\"\n");
   std::vector<unsigned char> nor = dir.Read(kNor);
   nor[0x10071] = 'X';  // the type of the first memory controller
   dir.Write("mcet.bin", nor);

@@ -5,6 +5,7 @@
 // over it, and nothing else changed.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <filesystem>
 #include <fstream>
@@ -20,7 +21,9 @@ using stbplat::test::RunTool;
 using stbplat::test::ScratchDir;
 
 const std::string kExample = std::string(STBPLAT_SOURCE_DIR) + "/examples/device";
-constexpr uint64_t kNandPage = 2048, kNandOob = 64;
+constexpr uint64_t kNandPage = 2048, kNandOob = 64, kNandBlock = 0x20000;
+// What marking a block bad leaves in the first OOB byte of its first page.
+constexpr unsigned char kBadBlockMarker = 0x00;
 
 struct Row {
   const char* ini;  // dev/NAME.ini the fault keys are added to
@@ -31,6 +34,7 @@ struct Row {
   const char* chip;     // the image compared afterwards (mtd7: NAND with OOB bytes)
   uint64_t erasedAt = 0, erasedLength = 0;  // erased first
   uint64_t wroteAt = 0, wroteLength = 0;    // then the input's first bytes programmed here
+  std::vector<uint64_t> markedBad = {};     // NAND blocks erased and marked bad, as the kernel marks them
 };
 
 const Row kRows[] = {
@@ -51,8 +55,26 @@ const Row kRows[] = {
     {"mtd8", "powercut = 0", {"erase", "NOR0.PANEL.A", "--yes"}, 1, "it may not be erased", "mtd8"},
     {"mtd7", "powercut = 2", {"write", "NAND0.PKGHDR.A", "@/12k", "--erase", "--yes"}, 0,
      "wrote 12288 bytes to NAND0.PKGHDR.A", "mtd7", 0, 0x20000, 0, 0x3000},  // the erase and one write
-    // An ECC failure: the read fails, the chip is as it was.
-    {"mtd7", "eccpages = 0x800", {"read", "NAND0.PKGHDR.A", "-o", "@/out"}, 1, "ECC", "mtd7"},
+    // eMMC (mtd10 is EMMC0.APPS.B, a window at 0x80000): whole pages from the
+    // offset must fit; a chunk the device keeps refusing is not tried for ever.
+    {"mmca", "", {"write", "EMMC0.APPS.B+0x7FF9C", "@/100", "--yes"}, 2,
+     "100 bytes at +0x7FF9C change 0x800 bytes, up to +0x8079C, past the end of /dev/mtd10", "mmca"},
+    {"mmca", "fullfrom = 0xC0000", {"write", "EMMC0.APPS.B", "@/12k", "--erase", "--yes"}, 1,
+     "filling with 0xFF kept failing at 0x0 (/dev/mtd10)", "mmca", 0x80000, 0x40000},
+    {"mmca", "powercut = 2", {"write", "EMMC0.APPS.B+0x800", "@/12k", "--erase", "--yes"}, 0,
+     "wrote 12288 bytes to EMMC0.APPS.B+0x800", "mmca", 0x80000, 0x80000, 0x80800, 0x3000},
+    // A weak page in KERNEL.A's first block (chip block 1): the block is marked
+    // bad, the write goes on in block 3 (2 is bad).
+    {"mtd7", "weakpages = 0x21000", {"write", "NAND0.KERNEL.A", "@/12k", "--erase", "--yes"}, 0,
+     "writes failed in the block at +0x0, which the library marked bad (the data went on in the next good blocks); "
+     "NAND0.KERNEL.A now has 2 good blocks (262144 bytes)", "mtd7", 0x20000, 0x80000, 0x60000, 0x3000, {0x20000}},
+    // A full NAND: every block the write tries is marked bad, and the message says so.
+    {"mtd7", "fullfrom = 0x22000", {"write", "NAND0.KERNEL.A", "@/12k", "--erase", "--yes"}, 1,
+     "writing failed at 0x0; the first 0x0 bytes are written, the rest of the slot is erased; writes failed in the "
+     "blocks at +0x0, +0x40000, +0x60000, which the library marked bad; NAND0.KERNEL.A has no good block left",
+     "mtd7", 0x20000, 0x80000, 0, 0, {0x20000, 0x60000, 0x80000}},
+    // An ECC failure: the read fails naming the page, the chip is as it was.
+    {"mtd7", "eccpages = 0x800", {"read", "NAND0.PKGHDR.A", "-o", "@/out"}, 1, "reading failed at 0x800", "mtd7"},
 };
 
 uint64_t FileOffset(const std::string& chip, uint64_t offset) {
@@ -65,6 +87,7 @@ TEST(Faults, EachRowLeavesTheChipAsItMust) {
   for (int i = 0; i < 0x10000; ++i) input += static_cast<char>(i % 251);  // never 0xFF
   dir.Write("64k", input);
   dir.Write("12k", input.substr(0, 0x3000));
+  dir.Write("100", input.substr(0, 100));
   for (const Row& row : kRows) {
     const std::string root = dir / "device";
     std::filesystem::remove_all(root);
@@ -80,6 +103,10 @@ TEST(Faults, EachRowLeavesTheChipAsItMust) {
     for (uint64_t at = row.erasedAt; at < row.erasedAt + row.erasedLength; ++at) chip[FileOffset(row.chip, at)] = 0xFF;
     for (uint64_t i = 0; i < row.wroteLength; ++i)
       chip[FileOffset(row.chip, row.wroteAt + i)] &= static_cast<unsigned char>(input[i]);
+    for (uint64_t block : row.markedBad) {
+      for (uint64_t at = block; at < block + kNandBlock; ++at) chip[FileOffset(row.chip, at)] = 0xFF;
+      chip[FileOffset(row.chip, block) + kNandPage] = kBadBlockMarker;
+    }
     const std::vector<unsigned char> after = dir.Read("device/dev/" + std::string(row.chip));
     ASSERT_EQ(chip.size(), after.size());
     uint64_t first = 0;

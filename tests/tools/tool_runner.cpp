@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <string>
 
 #include "support/scratch_dir.h"
 
@@ -20,16 +21,21 @@ std::string Quoted(const std::string& text) {
   return quoted + "'";
 }
 
-// Every command, on every root and input the tests give it, ends by itself
-// within this time, and a failing one says why in fewer than kMaxErrorLines.
-constexpr int kMaxSeconds = 20;
+// No command may run away: one that still runs after this long is killed,
+// and its output files stop growing at this size (512-byte blocks), which
+// ends the program too.
+constexpr int kSecondsAllowed = 20;
+constexpr int kOutputBlocksAllowed = 16384;
+// A failing command says why in fewer lines than this.
 constexpr long kMaxErrorLines = 50;
 
 }  // namespace
 
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input) {
   ScratchDir scratch;
-  std::string command = "timeout -s KILL " + std::to_string(kMaxSeconds) + " env -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL " + Quoted(STBPLAT_TOOL_PATH);
+  std::string command = "ulimit -f " + std::to_string(kOutputBlocksAllowed) +
+                        "; env -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL timeout -s KILL " +
+                        std::to_string(kSecondsAllowed) + " " + Quoted(STBPLAT_TOOL_PATH);
   for (const std::string& arg : args) command += " " + Quoted(arg);
   command += " <" + Quoted(scratch.Write("stdin", input)) + " >" + Quoted(scratch / "stdout") +
              " 2>" + Quoted(scratch / "stderr");
@@ -40,7 +46,7 @@ ToolRun RunTool(const std::vector<std::string>& args, const std::string& input) 
   const std::vector<unsigned char> err = scratch.Read("stderr");
   run.out.assign(out.begin(), out.end());
   run.err.assign(err.begin(), err.end());
-  EXPECT_LT(run.exitCode, 128) << "ended by a signal, or ran past " << kMaxSeconds << " s";
+  EXPECT_LT(run.exitCode, 128) << "ended by a signal, or ran past " << kSecondsAllowed << " s";
   EXPECT_LT(std::count(run.err.begin(), run.err.end(), '\n'), kMaxErrorLines);
   return run;
 }

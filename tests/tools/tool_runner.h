@@ -15,10 +15,10 @@ struct ToolRun {
   std::string err;
 };
 
-// args reach the program as they are; input is its standard input.
-// STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared. A run that ends by a signal,
-// takes more than 20 s or prints 50 lines or more to standard error fails the
-// calling test.
+// args reach the program as they are; input is its standard input. A run
+// is killed after 20 s or 8 MiB of output; one that ends by a signal or
+// prints 50 lines or more to standard error fails the calling test.
+// STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared.
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input = "");
 
 }  // namespace test

@@ -7,14 +7,15 @@ _stbplat() {
   # The command words typed so far, without options and their values.
   for ((i = 1; i < COMP_CWORD; i++)); do
     case ${COMP_WORDS[i]} in
-      --root | -o | --output | --at | --type | -n | -s | --length | --offset | --indent | --bb) ((i++)) ;;
+      --root | -o | --output | --at | --type | -n | -s | --length | --offset | --indent | \
+        --nand | --nor | --emmc | --slot | --proc-mtd | --dump | --window | --memory-map | --bb) ((i++)) ;;
       -*) ;;
       *) words+=("${COMP_WORDS[i]}") ;;
     esac
   done
   case ${COMP_WORDS[COMP_CWORD - 1]} in
     --root) COMPREPLY=($(compgen -d -- "$cur")); return ;;
-    -o | --output) COMPREPLY=($(compgen -f -- "$cur")); return ;;
+    -o | --output | --proc-mtd | --memory-map) COMPREPLY=($(compgen -f -- "$cur")); return ;;
     --bb) COMPREPLY=($(compgen -W "skipbad padbad dumpbad" -- "$cur")); return ;;
   esac
   # --bb=METHOD in one word.

@@ -11,6 +11,9 @@ constexpr unsigned char kErased = 0xFF;
 constexpr unsigned char kBadBlockMarker = 0x00;
 constexpr int kNorChipMtd = 8;   // the whole NOR chip: MTD 8, as the fixed NOR mapping expects
 constexpr int kNandChipMtd = 7;
+// eMMC slot rows are windows of the device in its 512-byte sectors.
+constexpr uint64_t kEmmcSector = 512;
+constexpr int kLastMtd = 10;
 
 std::string HexText(uint64_t value, int digits) {
   char text[32];
@@ -28,9 +31,10 @@ bool IsBadNandBlock(uint64_t block) {
   return false;
 }
 
-// The kernel's name of a partition: flash0 is the NOR chip, flash1 the NAND.
+// The kernel's name of a partition: flash0 is the NOR chip, flash1 the NAND;
+// eMMC slots are named as the memory map names them.
 std::string KernelName(const Slot& s) {
-  const char* chip = s.chip == Chip::kNor ? "flash0" : "flash1";
+  const char* chip = s.chip == Chip::kNor ? "flash0" : s.chip == Chip::kNand ? "flash1" : "EMMC0";
   return std::string(chip) + "." + s.partition + "." + s.slot;
 }
 
@@ -46,9 +50,10 @@ const std::vector<Slot>& Slots() {
       {Chip::kNand, "KERNEL", "A", 0x20000, 512 * kKiB, 5, 0, 512 * kKiB},
       {Chip::kNand, "ROOTFS", "A", 0xA0000, 384 * kKiB, 6, 0, 384 * kKiB},
       // The eMMC's slots are read at their offset in the partition as an
-      // offset in the whole device, so its one partition starts at 0.
-      {Chip::kEmmc, "APPS", "A", 0x00000, 512 * kKiB, -1, 0x00000, 1024 * kKiB},
-      {Chip::kEmmc, "APPS", "B", 0x80000, 512 * kKiB, -1, 0x80000, 1024 * kKiB},
+      // offset in the whole device, so its one partition starts at 0. Each
+      // has a row of its own, through which the flash layer writes it.
+      {Chip::kEmmc, "APPS", "A", 0x00000, 512 * kKiB, 9, 0x00000, 1024 * kKiB},
+      {Chip::kEmmc, "APPS", "B", 0x80000, 512 * kKiB, 10, 0x80000, 1024 * kKiB},
   };
   return slots;
 }
@@ -110,10 +115,10 @@ bool Layout::Place(const char* partition, const char* slotName, uint64_t offset,
 
 std::string Layout::ProcMtd() const {
   std::string text = "dev:    size   erasesize  name\n";
-  std::vector<std::string> lines(kNorChipMtd + 1);
+  std::vector<std::string> lines(kLastMtd + 1);
   for (const Slot& s : Slots()) {
     if (s.mtd < 0) continue;
-    uint64_t erase = s.chip == Chip::kNor ? kNorSector : kNandBlock;
+    uint64_t erase = s.chip == Chip::kNor ? kNorSector : s.chip == Chip::kNand ? kNandBlock : kEmmcSector;
     lines[static_cast<size_t>(s.mtd)] = "mtd" + std::to_string(s.mtd) + ": " + HexText(s.size, 8) + " " +
                                         HexText(erase, 8) + " \"" + KernelName(s) + "\"\n";
   }
@@ -143,7 +148,7 @@ std::vector<std::pair<std::string, std::string>> Layout::GeometryFiles() const {
                    "size = " + std::to_string(kEmmcSize) + "\n"});
   for (const Slot& s : Slots()) {
     if (s.mtd < 0) continue;
-    const char* image = s.chip == Chip::kNor ? norImageName : nandImageName;
+    const char* image = s.chip == Chip::kNor ? norImageName : s.chip == Chip::kNand ? nandImageName : "mmca";
     files.push_back({"mtd" + std::to_string(s.mtd) + ".ini",
                      "; " + KernelName(s) + ": a window of " + image + "\n"
                      "image = " + image + "\n"
@@ -173,7 +178,7 @@ std::string Layout::MemoryMap() const {
         text += std::string("\n[partition ") + DeviceName(chip) + "." + s.partition + "]\noffset = 0x" +
                 HexText(start, 6) + "\nsize = 0x" + HexText(s.partitionSize, 6) + "\n";
       }
-      std::string node = s.mtd >= 0 ? "/dev/mtd" + std::to_string(s.mtd) : "/dev/mmca";
+      std::string node = s.chip != Chip::kEmmc ? "/dev/mtd" + std::to_string(s.mtd) : "/dev/mmca";
       text += std::string("\n[slot ") + DeviceName(chip) + "." + s.partition + "." + s.slot + "]\noffset = 0x" +
               HexText(s.partitionOffset, 6) + "\nsize = 0x" + HexText(s.size, 6) + "\nnode = " + node + "\n";
     }

@@ -15,6 +15,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <functional>
 #include <iostream>
 #include <memory>
 #include <string>
@@ -23,10 +24,13 @@
 #include "actions.h"
 #include "bad_blocks.h"
 #include "device_table.h"
+#include "emmc_slot.h"
 #include "location_arg.h"
 #include "mtd_erase.h"
 #include "mtd_partition_arg.h"
 #include "raw_read.h"
+#include "log_sink.h"
+#include "marked_bad.h"
 #include "output.h"
 #include "stbplat/extruder.h"
 #include "stbplat/flash_interface.h"
@@ -36,6 +40,10 @@
 
 namespace stbtool {
 namespace {
+
+Location LocationOf(const LocationArg& arg) {
+  return ToComponentLocation(arg).location;
+}
 
 // Transfers move in pieces of this size, a few erase blocks of any of the
 // device's media: memory stays bounded whatever the transfer's size, and
@@ -63,6 +71,12 @@ struct Target {
   // The MTD partition the target lies in, when it has one of its own.
   MtdPartition partition;
   bool hasPartition = false;
+  // A slot on eMMC: read at its place on the whole device, written through
+  // its own node when /proc/mtd has one.
+  bool emmc = false;
+  unsigned long emmcPlace = 0;
+  bool emmcNodeKnown = false;
+  EmmcSlotNode emmcNode;
 };
 
 // What a transfer can reach: NAND transfers skip bad blocks, so a NAND
@@ -116,31 +130,71 @@ Target ParseTarget(const std::string& text, bool mtd, const std::string& command
                      "': expected DEVICE.PARTITION.SLOT[+OFFSET], --mtd NAME or a NOR address");
   t.offset = t.location.offset;
   RequireKnownSlot(t.location, command);
-  // A slot with a partition of its own tells its size (less its bad
-  // blocks); any other slot takes its size from the memory map.
-  std::string upper = t.location.device + "." + t.location.partition + "." + t.location.slot;
-  std::transform(upper.begin(), upper.end(), upper.begin(), [](unsigned char c) { return std::toupper(c); });
-  if (const MtdPartition* p = FindPartition(table, upper)) {
-    SetRoom(t, *p);
-    return t;
-  }
+  ExtendedMemoryMapStructure* map = ExtendedMemoryMapStructure::Instance();
   Location location = ToComponentLocation(t.location).location;
   unsigned long slotSize = 0, slotOffset = 0;
-  if (ExtendedMemoryMapStructure::Instance()->GetSlotSizeAndOffset(&location, &slotSize, &slotOffset) &&
-      t.offset <= slotSize) {
+  const bool slotKnown = map->GetSlotSizeAndOffset(&location, &slotSize, &slotOffset);
+  if (slotKnown && map->IsEMMCDevice(&location) && !map->IsSlotAFile(&location)) {
+    t.emmc = true;
+    t.emmcPlace = slotOffset;
+    t.emmcNodeKnown = FindEmmcSlotNode(location, &t.emmcNode);
+  }
+  // A slot with a partition of its own tells its size (less its bad
+  // blocks); any other slot (and an eMMC slot, read from the whole device)
+  // takes its size from the memory map.
+  std::string upper = t.location.device + "." + t.location.partition + "." + t.location.slot;
+  std::transform(upper.begin(), upper.end(), upper.begin(), [](unsigned char c) { return std::toupper(c); });
+  const MtdPartition* own = FindPartition(table, upper);
+  if (own != nullptr && !t.emmc) {
+    SetRoom(t, *own);
+    return t;
+  }
+  if (slotKnown && t.offset <= slotSize) {
     t.room = slotSize - t.offset;
     t.roomKnown = true;
   }
   return t;
 }
 
+// Bytes a write at the target may hold: an eMMC write changes whole pages
+// from its offset, all of which must lie in the slot's node.
+unsigned long WriteRoom(const Target& t) {
+  return t.emmc ? EmmcWriteRoom(t.emmcNode.size, t.offset) : t.room;
+}
+
+bool WriteRoomKnown(const Target& t) { return t.emmc ? t.emmcNodeKnown : t.roomKnown; }
+
+// An eMMC slot is changed only through a node of its own; a slot that is not
+// whole write units could not be filled without passing its end.
+void RequireEmmcNode(const Target& t, const std::string& command, bool whole) {
+  if (!t.emmc) return;
+  const std::string name = LocationText(LocationOf(t.location));
+  if (!t.emmcNodeKnown)
+    throw UsageError(command + ": " + t.text + ": /proc/mtd has no row named " + name +
+                     "; an eMMC slot is written through a node of its own (docs/device-root.md); nothing was changed");
+  if (whole && EmmcWriteRoom(t.emmcNode.size, 0) != t.emmcNode.size)
+    throw UsageError(command + ": " + t.text + ": its node " + t.emmcNode.path + " (" + Hex(t.emmcNode.size) +
+                     " bytes) is not whole " + Hex(EmmcWriteUnit()) +
+                     "-byte eMMC pages, so it cannot be filled without passing its end; nothing was changed");
+}
+
+// The library's eMMC write rounds the length up to whole pages: refuses,
+// before any change, a write whose rounded range passes the slot's node.
+void CheckEmmcRange(const Target& t, const std::string& command, unsigned long length) {
+  if (!t.emmc || length <= WriteRoom(t)) return;
+  const unsigned long unit = EmmcWriteUnit();
+  const unsigned long span = (length + unit - 1) / unit * unit;
+  throw UsageError(command + ": " + t.text + ": eMMC is written in whole " + Hex(unit) + "-byte pages, so " +
+                   std::to_string(length) + " bytes at +" + Hex(t.offset) + " change " + Hex(span) +
+                   " bytes, up to +" + Hex(t.offset + span) + ", past the end of " + t.emmcNode.path + " (" +
+                   Hex(t.emmcNode.size) + " bytes; room for " + std::to_string(WriteRoom(t)) +
+                   " bytes there); nothing was changed");
+}
+
 void RequireYes(bool yes, const std::string& command, const Target& t) {
   if (!yes) throw UsageError(command + " " + t.text + " changes the device; add --yes to go ahead");
 }
 
-Location LocationOf(const LocationArg& arg) {
-  return ToComponentLocation(arg).location;
-}
 
 // The bytes of a target in order, one piece at a time, through the
 // library's own calls: a location through its stream (which follows the
@@ -167,6 +221,12 @@ class TargetStream {
       nandByLocation_ = true;
       return;
     }
+    // An eMMC slot by call too: the stream would write at the slot's place
+    // on the device inside the slot's own node, past where the slot starts.
+    if (t.emmc) {
+      if (writing && !t.emmcNodeKnown) throw Failure("flash write: cannot open " + t.text);
+      return;
+    }
     if (writing) {
       out_.reset(new Intruder(&component_));
       if (!out_->isInitedOK) throw Failure("flash write: cannot open " + t.text);
@@ -188,6 +248,8 @@ class TargetStream {
       ok = flash_->ReadFromNORFlashAtAddr(norAddress_ + done_, data, n);
     } else if (nandByLocation_) {
       ok = flash_->NANDRead(data, n, &component_.location, t_.offset + done_);
+    } else if (t_.emmc) {
+      ok = flash_->EMMCRead(data, n, &component_.location, t_.emmcPlace + t_.offset + done_);
     } else if (t_.form == TargetForm::kNorAddress) {
       ok = flash_->ReadFromNORFlashAtAddr(Position(), data, n);
     } else if (t_.medium == Medium::kNand) {
@@ -210,6 +272,8 @@ class TargetStream {
       ok = flash_->WriteToNORFlashAtAddr(norAddress_ + done_, data, n);
     } else if (nandByLocation_ || t_.medium == Medium::kNand) {
       ok = WriteNandPages(data, n);
+    } else if (t_.emmc) {
+      ok = WriteEmmcSlot(t_.emmcNode, t_.offset + done_, data, n, onEndlessRetry);
     } else if (t_.form == TargetForm::kNorAddress) {
       ok = flash_->WriteToNORFlashAtAddr(Position(), data, n);
     } else {
@@ -220,6 +284,12 @@ class TargetStream {
     if (ok) done_ += n;
     return ok;
   }
+
+  // The message for a write the library keeps trying (eMMC): it ends the
+  // process.
+  std::function<std::string()> onEndlessRetry = [this]() {
+    return "flash write: " + t_.text + ": writing failed at " + Hex(Position()) + " and kept failing";
+  };
 
   // Whether bytes move through the library's calls by offset (not a stream),
   // so that Skip can place a read anywhere.
@@ -375,9 +445,10 @@ unsigned long WriteFromFile(const Target& t, CommandFile& input, const std::stri
   Progress progress("writing " + t.text, total);
   unsigned long done = 0;
   for (unsigned long got; (got = input.Read(piece.data(), kPiece)) > 0; done += got) {
-    if (t.roomKnown && done + got > t.room)
-      throw Failure("flash write: " + name + " does not fit in " + t.text + " (" + std::to_string(t.room) +
+    if (WriteRoomKnown(t) && done + got > WriteRoom(t))
+      throw Failure("flash write: " + name + " does not fit in " + t.text + " (" + std::to_string(WriteRoom(t)) +
                     " bytes left)");
+    out.onEndlessRetry = [&]() { return std::string(WriteFailure(t, piece.data(), got, done, erased).what()); };
     if (!out.Write(piece.data(), got)) throw WriteFailure(t, piece.data(), got, done, erased);
     if (back) {
       out.Flush();
@@ -450,6 +521,24 @@ void RunRawReadOf(const Target& t, const TransferArgs& args) {
   RunRawRead(t.partition, raw);
 }
 
+// A piece that does not read (a NAND page failing its ECC check, the kernel's
+// EBADMSG) is read again page by page to name the page that fails; the
+// start of the piece when the target is not read by pages.
+unsigned long FirstUnreadablePage(const Target& t, unsigned long done, unsigned long n) {
+  const unsigned long start = (t.form == TargetForm::kNorAddress ? t.address : t.offset) + done;
+  if (t.medium != Medium::kNand || t.pageSize == 0) return start;
+  TargetStream probe(t, false);
+  if (!probe.ReadsByCall()) return start;
+  probe.Skip(done);
+  std::vector<unsigned char> page(t.pageSize);
+  QuietLog quiet(eLogModuleFlashAccess);  // the library said it once already
+  for (unsigned long at = 0; at < n; at += t.pageSize) {
+    const unsigned long position = probe.Position();
+    if (!probe.Read(page.data(), std::min(t.pageSize, n - at))) return position;
+  }
+  return start;
+}
+
 void RunRead(const TransferArgs& args) {
   Target t = ParseTarget(args.target, args.mtd, "flash read");
   if (args.raw || args.oob || !args.badBlocks.empty()) return RunRawReadOf(t, args);
@@ -473,7 +562,8 @@ void RunRead(const TransferArgs& args) {
   Progress progress("reading " + t.text, length);
   for (unsigned long done = 0; done < length;) {
     unsigned long n = std::min(kPiece, length - done);
-    if (!in.Read(piece.data(), n)) throw Failure("flash read: " + t.text + ": reading failed at " + Hex(in.Position()));
+    if (!in.Read(piece.data(), n))
+      throw Failure("flash read: " + t.text + ": reading failed at " + Hex(FirstUnreadablePage(t, done, n)));
     sink.Write(piece.data(), n);
     done += n;
     progress.Update(done);
@@ -482,26 +572,11 @@ void RunRead(const TransferArgs& args) {
   NoteSkippedBadBlocks("flash read", t, length, false, 0);
 }
 
-// eMMC has no erase: a slot is filled with the erased value, piece by
-// piece, through the library's pattern fill.
-bool FillEmmcSlot(const Location& location, const std::string& label) {
-  unsigned long size = 0, offset = 0;
-  if (!ExtendedMemoryMapStructure::Instance()->GetSlotSizeAndOffset(&location, &size, &offset)) return false;
-  FlashInterface* flash = FlashInterface::Instance();
-  Progress progress(label, size);
-  for (unsigned long done = 0; done < size;) {
-    unsigned long n = std::min(kPiece, size - done);
-    Location slot = location;
-    if (!flash->EMMCErase(&slot, done, n, kErasedByte)) return false;
-    done += n;
-    progress.Update(done);
-  }
-  return true;
-}
-
-bool EraseLocation(const Location& location, const std::string& text) {
-  if (ExtendedMemoryMapStructure::Instance()->IsEMMCDevice(&location))
-    return FillEmmcSlot(location, "erasing " + text);
+// eMMC has no erase: the slot is filled with the erased value through its
+// own node (the library's pattern fill would add the slot's place on the
+// device to an offset inside that node).
+bool EraseLocation(const Target& t, const Location& location, const std::string& command) {
+  if (t.emmc) return FillEmmcSlot(t.emmcNode, command, "erasing " + t.text);
   return FlashInterface::Instance()->EraseSlot(&location);
 }
 
@@ -539,7 +614,7 @@ void EraseSlotOf(const Target& t, const std::string& command) {
       throw UsageError(command + ": " + t.mtdName + " is not a slot; erase a slot by its location");
     location = LocationOf(arg);
   }
-  if (!EraseLocation(location, t.text)) throw Failure(command + ": erasing " + t.text + " failed");
+  if (!EraseLocation(t, location, command)) throw Failure(command + ": erasing " + t.text + " failed");
   CheckSlotErased(t, command);
 }
 
@@ -568,17 +643,19 @@ void RunWrite(const TransferArgs& args) {
     throw UsageError("flash write: " + t.text + ": NAND is written from the start of a page (" +
                      Hex(t.pageSize) + " bytes); the page holding the offset starts at +" +
                      Hex(t.offset - t.offset % t.pageSize));
+  RequireEmmcNode(t, "flash write", args.erase);
   CommandFile input(args.file, false);
   // Before an erase the whole input must be known to fit: standard input is
   // taken into a temporary file first, no further than the room it has.
   // So is a raw write's, to know that it is whole pages.
-  const bool spooled = (args.erase || (args.raw && !args.pad)) && input.IsStream() && t.roomKnown;
-  if (spooled) input.Spool(t.room + 1);
+  const bool spooled = (args.erase || (args.raw && !args.pad)) && input.IsStream() && WriteRoomKnown(t);
+  if (spooled) input.Spool(WriteRoom(t) + 1);
   unsigned long size = 0;
   bool sized = input.Size(&size);
-  if (spooled && size > t.room)
-    throw UsageError("flash write: standard input holds more than the " + std::to_string(t.room) +
+  if (spooled && size > WriteRoom(t))
+    throw UsageError("flash write: standard input holds more than the " + std::to_string(WriteRoom(t)) +
                      " bytes " + t.text + " has; nothing was changed");
+  if (sized) CheckEmmcRange(t, "flash write", size);
   if (sized && t.roomKnown && size > t.room)
     throw UsageError("flash write: " + args.file + " (" + std::to_string(size) + " bytes) does not fit in " +
                      t.text + " (" + std::to_string(t.room) + " bytes left)");
@@ -588,15 +665,25 @@ void RunWrite(const TransferArgs& args) {
     throw UsageError("flash write --raw: " + args.file + " (" + std::to_string(size) + " bytes) is not whole " +
                      Hex(t.pageSize) + "-byte pages; pass --pad to fill the last page with 0xFF");
   RequireYes(args.yes, "flash write", t);
-  if (args.erase) {
-    if (t.form == TargetForm::kNorAddress) throw UsageError("flash write --erase: erase by address with flash erase");
-    EraseSlotOf(t, "flash write --erase");
+  if (args.erase && t.form == TargetForm::kNorAddress)
+    throw UsageError("flash write --erase: erase by address with flash erase");
+  const MarkedBadWatch marks(t.medium == Medium::kNand && t.hasPartition ? t.partition.name : std::string());
+  unsigned long written = 0;
+  try {
+    if (args.erase) EraseSlotOf(t, "flash write --erase");
+    written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0, args.erase);
+  } catch (const Failure& failure) {
+    throw Failure(failure.what() + marks.Note(false));
   }
-  unsigned long written = WriteFromFile(t, input, args.file, args.verify, sized ? size : 0, args.erase);
-  if (Options().json)
-    PrintJson({{"target", t.text}, {"written", written}, {"verified", args.verify}, {"erasedFirst", args.erase}});
-  else
-    std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << "\n";
+  if (Options().json) {
+    Json marked = Json::array();
+    for (unsigned long block : marks.Marked()) marked.push_back(block);
+    PrintJson({{"target", t.text}, {"written", written}, {"verified", args.verify}, {"erasedFirst", args.erase},
+               {"markedBad", marked}});
+  } else {
+    std::cerr << "wrote " << written << " bytes to " << t.text << (args.verify ? ", verified" : "") << marks.Note(true)
+              << "\n";
+  }
   NoteSkippedBadBlocks("flash write", t, written, args.raw, rawOffset);
 }
 
@@ -665,9 +752,10 @@ void RunErase(const EraseArgs& args, bool sectorOnly) {
     if (!sectorOnly && !args.hasLength) throw UsageError(command + ": give --length to erase by address");
     CheckNorEraseRange(command, t.address, sectorOnly ? flash->GetNORSectorSize() : args.length);
   } else if (sectorOnly) {
-    Location location = LocationOf(t.location);
-    if (ExtendedMemoryMapStructure::Instance()->IsEMMCDevice(&location))
+    if (t.emmc)
       throw UsageError(command + ": " + t.text + " is on eMMC, which has no erase sectors; use flash erase");
+  } else {
+    RequireEmmcNode(t, command, true);
   }
   RequireYes(args.yes, command, t);
   bool ok = false;
@@ -678,7 +766,7 @@ void RunErase(const EraseArgs& args, bool sectorOnly) {
   } else {
     if (t.location.hasOffset) throw UsageError(command + ": " + t.text + ": slots are erased whole, without an offset");
     Location location = LocationOf(t.location);
-    ok = sectorOnly ? flash->EraseSector(&location) : EraseLocation(location, t.text);
+    ok = sectorOnly ? flash->EraseSector(&location) : EraseLocation(t, location, command);
     if (ok && !sectorOnly) CheckSlotErased(t, command);
   }
   if (!ok) throw Failure(command + ": erasing " + t.text + " failed");

@@ -1,15 +1,38 @@
 #include "log_sink.h"
 
+#include <signal.h>
+#include <unistd.h>
+
 #include <cstdarg>
 #include <cstdio>
+#include <cstdlib>
 #include <string>
+#include <utility>
 
 #include "output.h"
+#include "tool.h"
 
 namespace stbtool {
 namespace {
 
 DisplayCapture* activeCapture = nullptr;
+EndlessRetryStop* activeRetryStop = nullptr;
+
+// A device that fails this often in a row within one call does not recover
+// by being asked again; a few tries leave room for a passing hiccup.
+constexpr unsigned int kRetryErrorLimit = 8;
+// No one call moves more than a transfer piece (a megabyte): a call that
+// takes this long is retrying without errors that reach the log.
+constexpr unsigned int kRetrySeconds = 15;
+constexpr char kRetryTimeout[] =
+    "stbplat: the device did not take a write within 15 s (the library tries a failing write again without "
+    "end); stopped. The range written may be partly changed\n";
+
+void OnRetryTimeout(int) {
+  ssize_t ignored = write(STDERR_FILENO, kRetryTimeout, sizeof kRetryTimeout - 1);
+  (void)ignored;
+  _exit(kExitFailed);
+}
 
 // The level the user asked for, per module; a capture raises the library's
 // gate above it for display lines only.
@@ -84,6 +107,39 @@ QuietLog::QuietLog(etLogUtilModuleId module) : module_(module), savedLevel_(subS
 
 QuietLog::~QuietLog() { subSystemLogLevel[module_] = savedLevel_; }
 
+EndlessRetryStop::EndlessRetryStop(std::function<std::string()> report)
+    : report_(std::move(report)), savedLevel_(subSystemLogLevel[eLogModuleFlashAccess]), previous_(activeRetryStop) {
+  ErrorLevel(eLogModuleFlashAccess);  // the user's level decides what is shown
+  if (subSystemLogLevel[eLogModuleFlashAccess] < eLogLevelError) subSystemLogLevel[eLogModuleFlashAccess] = eLogLevelError;
+  activeRetryStop = this;
+  signal(SIGALRM, OnRetryTimeout);
+  alarm(kRetrySeconds);
+}
+
+EndlessRetryStop::~EndlessRetryStop() {
+  alarm(0);
+  subSystemLogLevel[eLogModuleFlashAccess] = savedLevel_;
+  activeRetryStop = previous_;
+}
+
+// Counts a flash error for the innermost stop; at its limit the report is
+// taken (its own library calls no longer counted) and the process ends.
+void CountRetry(unsigned int level) {
+  EndlessRetryStop* stop = activeRetryStop;
+  if (stop == nullptr || level > eLogLevelError || ++stop->errors_ < kRetryErrorLimit) return;
+  alarm(0);
+  activeRetryStop = nullptr;
+  std::string message;
+  {
+    QuietLog quiet(eLogModuleFlashAccess);
+    message = stop->report_();
+  }
+  FlushLogRepeats();
+  std::fprintf(stderr, "stbplat: %s\n", message.c_str());
+  std::fflush(nullptr);
+  std::_Exit(kExitFailed);
+}
+
 std::string DisplayCapture::Text() const { return PrintableLines(WithoutCarriageReturns(text_)); }
 
 }  // namespace stbtool
@@ -104,6 +160,7 @@ extern "C" void GlobalLogUtilAdd(etLogUtilModuleId moduleId, unsigned int level,
   if (needed > 0) std::vsnprintf(&text[0], text.size() + 1, format, args);
   va_end(args);
 
+  if (moduleId == eLogModuleFlashAccess) stbtool::CountRetry(level);
   bool taken = false;
   stbtool::Collect(stbtool::activeCapture, moduleId, level, text, &taken);
   if (taken || level > stbtool::ErrorLevel(moduleId)) return;

@@ -6,6 +6,7 @@
 #ifndef STBPLAT_TOOL_LOG_SINK_H
 #define STBPLAT_TOOL_LOG_SINK_H
 
+#include <functional>
 #include <string>
 
 #include "stbplat/log.h"
@@ -55,6 +56,27 @@ class QuietLog {
  private:
   etLogUtilModuleId module_;
   unsigned int savedLevel_;
+};
+
+// While alive, errors from the flash module are counted (and shown as the
+// user's level says): for a library call that retries a failing device write
+// without end. Once `limit` errors have come, or `seconds` have passed, the
+// call cannot be left any other way: the process ends with exit code 1 after
+// printing `report()` (on the time limit, a fixed line, as the report may not
+// run there).
+class EndlessRetryStop {
+ public:
+  explicit EndlessRetryStop(std::function<std::string()> report);
+  ~EndlessRetryStop();
+  EndlessRetryStop(const EndlessRetryStop&) = delete;
+  EndlessRetryStop& operator=(const EndlessRetryStop&) = delete;
+
+ private:
+  std::function<std::string()> report_;
+  unsigned int errors_ = 0;
+  unsigned int savedLevel_;
+  EndlessRetryStop* previous_;
+  friend void CountRetry(unsigned int level);
 };
 
 }  // namespace stbtool

@@ -57,6 +57,7 @@ int Run(int argc, char** argv) {
   RegisterChecksumCommands(app);
   RegisterDiskCommands(app);
   RegisterUtilCommands(app);
+  RegisterRootCommands(app);
 
   try {
     app.parse(argc, argv);

@@ -49,6 +49,7 @@ void RegisterMapCommand(CLI::App& app);
 void RegisterDiskCommands(CLI::App& app);
 void RegisterChecksumCommands(CLI::App& app);
 void RegisterUtilCommands(CLI::App& app);
+void RegisterRootCommands(CLI::App& app);
 
 }  // namespace stbtool
 
