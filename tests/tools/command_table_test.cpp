@@ -174,6 +174,12 @@ const Row kRows[] = {
     {{"root", "make", "@/box", "--proc-mtd", "@/box-mtd", "--dump", "mtd0=@/device/dev/mtd7,2048,64", "--window",
       "mtd1=mtd0+0x20000"}, 0, kErr, "made @/box"},
     {{"--root", "@/box", "mtd", "list"}, 0, kOut, "mtd1   NAND0.KERNEL.A       NAND     512 KiB"},
+    // A slot without a partition of its own ("@/split": PANEL.A halved, PANEL.B behind it on /dev/mtd11, which
+    // is not there): reached by address through the chip, and no node file is made.
+    {{"--root", "@/split", "flash", "read", "NOR0.PANEL.B", "-n", "4", "-o", "-"}, 0, kExactOut, "\xFF\xFF\xFF\xFF"},
+    {{"--root", "@/split", "flash", "write", "NOR0.PANEL.B", "@/dump.bin", "--yes", "--verify"}, 0, kErr, "verified"},
+    {{"--root", "@/split", "flash", "read", "0xE0038000", "-n", "3", "-o", "-"}, 0, kExactOut, "ABC"},
+    {{"crc32", "@/split/dev/mtd11"}, 1, kErr, "No such file or directory"},
     // A read from a slot that is not there leaves the output file alone.
     {{"--root", "@/device", "flash", "read", "NOR0.PANL.A", "-n", "16", "-o", "@/check.txt"}, 2, kErr, "PANL"},
     {{"crc32", "@/check.txt"}, 0, kExactOut, "0xCBF43926  @/check.txt\n"},
@@ -214,6 +220,14 @@ std::string Expand(std::string text, const std::string& dir) {
 TEST(Commands, AnswerEachRow) {
   ScratchDir dir;
   std::filesystem::copy(kExample, dir / "device", std::filesystem::copy_options::recursive);
+  std::filesystem::copy(kExample, dir / "split", std::filesystem::copy_options::recursive);
+  const std::vector<unsigned char> map = dir.Read("split/memory-map.ini");
+  std::string split(map.begin(), map.end());
+  const std::string panel = "[slot NOR0.PANEL.A]\noffset = 0x000000\nsize = 0x010000\nnode = /dev/mtd3\n";
+  split.replace(split.find(panel), panel.size(),
+                "[slot NOR0.PANEL.A]\noffset = 0\nsize = 0x8000\nnode = /dev/mtd3\n\n"
+                "[slot NOR0.PANEL.B]\noffset = 0x8000\nsize = 0x8000\nnode = /dev/mtd11\n");
+  dir.Write("split/memory-map.ini", split);
   dir.Write("check.txt", "123456789");
   dir.Write("long.bin", std::string(70000, 'a'));
   dir.Write("dump.bin", std::string("ABCDEFGHIJKLMNOPQ\0\x7f", 19));
