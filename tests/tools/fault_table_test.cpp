@@ -73,6 +73,10 @@ const Row kRows[] = {
      "writing failed at 0x0; the first 0x0 bytes are written, the rest of the slot is erased; writes failed in the "
      "blocks at +0x0, +0x40000, +0x60000, which the library marked bad; NAND0.KERNEL.A has no good block left",
      "mtd7", 0x20000, 0x80000, 0, 0, {0x20000, 0x60000, 0x80000}},
+    // The last partial page does not program: the message counts the whole block that did.
+    {"mtd7", "fullfrom = 0x60000", {"write", "NAND0.KERNEL.A", "@/128k+100", "--erase", "--yes"}, 1,
+     "writing failed at 0x20000; the first 0x20000 bytes are written, the rest of the slot is erased", "mtd7",
+     0x20000, 0x80000, 0x20000, 0x20000, {0x60000, 0x80000}},
     // An ECC failure: the read fails naming the page, the chip is as it was.
     {"mtd7", "eccpages = 0x800", {"read", "NAND0.PKGHDR.A", "-o", "@/out"}, 1, "reading failed at 0x800", "mtd7"},
 };
@@ -84,8 +88,9 @@ uint64_t FileOffset(const std::string& chip, uint64_t offset) {
 TEST(Faults, EachRowLeavesTheChipAsItMust) {
   ScratchDir dir;
   std::string input;
-  for (int i = 0; i < 0x10000; ++i) input += static_cast<char>(i % 251);  // never 0xFF
-  dir.Write("64k", input);
+  for (int i = 0; i < 0x20064; ++i) input += static_cast<char>(i % 251);  // never 0xFF
+  dir.Write("128k+100", input);
+  dir.Write("64k", input.substr(0, 0x10000));
   dir.Write("12k", input.substr(0, 0x3000));
   dir.Write("100", input.substr(0, 100));
   for (const Row& row : kRows) {

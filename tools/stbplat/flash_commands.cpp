@@ -49,6 +49,8 @@ Location LocationOf(const LocationArg& arg) {
 // device's media: memory stays bounded whatever the transfer's size, and
 // progress can be shown.
 constexpr unsigned long kPiece = 1024 * 1024;
+// The smallest read used to find how far a failed write got.
+constexpr unsigned long kReadBackStep = 2048;
 // What an erased eMMC slot holds, as erased flash does.
 constexpr unsigned char kErasedByte = 0xFF;
 // The memory map's technology of NOR devices.
@@ -425,7 +427,20 @@ Failure WriteFailure(const Target& t, const unsigned char* piece, unsigned long 
     std::vector<unsigned char> scratch(n);
     if (back.ReadsByCall()) {
       back.Skip(before);
-      if (back.Read(scratch.data(), n)) good = FirstDifference(piece, scratch.data(), n);
+      if (back.Read(scratch.data(), n)) {
+        good = FirstDifference(piece, scratch.data(), n);
+      } else {
+        // The piece's end may no longer read (a NAND write can leave the slot
+        // short of good blocks): count what is there a page at a time.
+        TargetStream pages(t, false);
+        pages.Skip(before);
+        const unsigned long step = std::max(t.pageSize, kReadBackStep);
+        for (unsigned long k; good < n && pages.Read(scratch.data(), k = std::min(step, n - good));) {
+          const unsigned long same = FirstDifference(piece + good, scratch.data(), k);
+          good += same;
+          if (same < k) break;
+        }
+      }
     }
   } catch (const Failure&) {
     // Not readable back: the piece's start is all that is known.
