@@ -109,6 +109,9 @@ const Row kRows[] = {
     {{"flash", "read", "not-a-target"}, 2, kErr, "'not-a-target'"},
     // The example device in host mode.
     {{"--root", "@/device", "map"}, 0, kOut, "bad blocks: 2 (at 0x40000) 5 (at 0xA0000)"},
+    // Box drawing only where the locale is UTF-8.
+    {{"LC_ALL=C", "--root", "@/device", "map"}, 0, kOut, "\n  part  |BOOT           |FSBLINFO"},
+    {{"LC_ALL=C.UTF-8", "--root", "@/device", "map"}, 0, kOut, "\n  part  \u2502BOOT           \u2502FSBLINFO"},
     // Its disk: identity and size from the ioctls, the temperature from smartctl through awk.
     {{"--root", "@/device", "disk", "info"}, 0, kOut, "serial     Z9A1EXMP\nsize       931.5 GiB"},
     {{"--root", "@/device", "disk", "temp"}, 0, kExactOut, "36 C\n"},

@@ -29,14 +29,23 @@ constexpr int kOutputBlocksAllowed = 16384;
 // A failing command says why in fewer lines than this.
 constexpr long kMaxErrorLines = 50;
 
+// NAME=VALUE with an upper-case name, as the shell takes assignments.
+bool IsAssignment(const std::string& arg) {
+  const size_t equals = arg.find('=');
+  return equals != std::string::npos && equals > 0 &&
+         arg.find_first_not_of("ABCDEFGHIJKLMNOPQRSTUVWXYZ_") == equals;
+}
+
 }  // namespace
 
 ToolRun RunTool(const std::vector<std::string>& args, const std::string& input) {
   ScratchDir scratch;
-  std::string command = "ulimit -f " + std::to_string(kOutputBlocksAllowed) +
-                        "; env -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL timeout -s KILL " +
-                        std::to_string(kSecondsAllowed) + " " + Quoted(STBPLAT_TOOL_PATH);
-  for (const std::string& arg : args) command += " " + Quoted(arg);
+  std::string command = "ulimit -f " + std::to_string(kOutputBlocksAllowed) + "; env";
+  std::string environment = " -u STBPLAT_ROOT -u STBPLAT_LOG_LEVEL";
+  size_t first = 0;  // leading NAME=VALUE arguments set the environment
+  for (; first < args.size() && IsAssignment(args[first]); ++first) environment += " " + Quoted(args[first]);
+  command += environment + " timeout -s KILL " + std::to_string(kSecondsAllowed) + " " + Quoted(STBPLAT_TOOL_PATH);
+  for (size_t i = first; i < args.size(); ++i) command += " " + Quoted(args[i]);
   command += " <" + Quoted(scratch.Write("stdin", input)) + " >" + Quoted(scratch / "stdout") +
              " 2>" + Quoted(scratch / "stderr");
   const int status = std::system(command.c_str());

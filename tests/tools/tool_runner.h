@@ -15,7 +15,8 @@ struct ToolRun {
   std::string err;
 };
 
-// args reach the program as they are; input is its standard input. A run
+// args reach the program as they are (leading NAME=VALUE ones go into its
+// environment instead); input is its standard input. A run
 // is killed after 20 s or 8 MiB of output; one that ends by a signal or
 // prints 50 lines or more to standard error fails the calling test.
 // STBPLAT_ROOT and STBPLAT_LOG_LEVEL are cleared.
