@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "bad_blocks.h"
+#include "mtd_partition_arg.h"
 #include "mtdio/mtd_node.h"
 #include "output.h"
 #include "tool.h"
@@ -39,9 +40,7 @@ void RunMtdErase(const MtdPartition& p, const RangeEraseArgs& args) {
   const std::string what = std::string(kCommand) + ": " + args.label;
   MtdNode node;
   MtdGeometry g;
-  if (!node.Open(p.path, false)) throw Failure(what + ": cannot open " + p.path + ": " + ErrorText(node.Error()));
-  if (!node.GetGeometry(&g) || g.eraseSize == 0)
-    throw Failure(what + ": " + p.path + " tells no geometry (MEMGETINFO): " + ErrorText(node.Error()));
+  OpenPartitionNode(p, what, true, &node, &g);
   const unsigned long block = g.eraseSize;
   const unsigned long length = args.hasLength ? args.length : (args.offset < p.size ? p.size - args.offset : 0);
   if (args.offset % block != 0 || length % block != 0 || length == 0)

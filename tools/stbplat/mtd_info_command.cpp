@@ -34,11 +34,7 @@ void RunMtdInfo(const std::string& name) {
   const MtdPartition& p = RequireMtdPartition(table, name, kCommand);
   MtdNode node;
   MtdGeometry g;
-  if (!node.Open(p.path, false))
-    throw Failure(std::string(kCommand) + ": cannot open " + p.path + ": " + std::strerror(node.Error()));
-  if (!node.GetGeometry(&g))
-    throw Failure(std::string(kCommand) + ": " + p.path + " tells no geometry (MEMGETINFO): " +
-                  std::strerror(node.Error()));
+  OpenPartitionNode(p, kCommand, false, &node, &g);
   const unsigned long blocks = g.eraseSize != 0 ? p.size / g.eraseSize : 0;
   std::vector<unsigned long> bad;
   bool badKnown = g.eraseSize != 0;

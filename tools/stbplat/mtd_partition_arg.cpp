@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cctype>
+#include <cstring>
 #include <vector>
 
 #include "mtdio/mtd_node.h"
@@ -72,6 +73,13 @@ const MtdPartition& RequireMtdPartition(const DeviceTable& table, const std::str
     throw UsageError(command + ": " + text +
                      ": no such MTD partition (give a name, mtdN or the kernel's name; see stbplat mtd list)");
   return *p;
+}
+
+void OpenPartitionNode(const MtdPartition& p, const std::string& what, bool needBlocks,
+                       stbplat::mtdio::MtdNode* node, stbplat::mtdio::MtdGeometry* g) {
+  if (!node->Open(p.path, false)) throw Failure(what + ": cannot open " + p.path + ": " + std::strerror(node->Error()));
+  if (!node->GetGeometry(g) || (needBlocks && g->eraseSize == 0))
+    throw Failure(what + ": " + p.path + " tells no geometry (MEMGETINFO): " + std::strerror(node->Error()));
 }
 
 }  // namespace stbtool

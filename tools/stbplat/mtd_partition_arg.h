@@ -8,6 +8,7 @@
 #include <string>
 
 #include "device_table.h"
+#include "mtdio/mtd_node.h"
 
 namespace stbtool {
 
@@ -17,6 +18,11 @@ const MtdPartition* FindMtdPartition(const DeviceTable& table, const std::string
 // The partition `text` names; a UsageError for `command` otherwise.
 const MtdPartition& RequireMtdPartition(const DeviceTable& table, const std::string& text,
                                         const std::string& command);
+
+// Opens p's node for reading and asks its geometry (with erase blocks, when
+// needBlocks); a Failure for `what` naming the node and the reason otherwise.
+void OpenPartitionNode(const MtdPartition& p, const std::string& what, bool needBlocks,
+                       stbplat::mtdio::MtdNode* node, stbplat::mtdio::MtdGeometry* g);
 
 // The kernel's name of /dev/mtdN, as /proc/mtd lists it; empty when unknown.
 std::string KernelName(int number);

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "bad_blocks.h"
+#include "mtd_partition_arg.h"
 #include "mtdio/mtd_node.h"
 #include "output.h"
 #include "tool.h"
@@ -104,9 +105,7 @@ void RunRawRead(const MtdPartition& p, const RawReadArgs& args) {
   const std::string what = std::string(kCommand) + ": " + args.label;
   MtdNode node;
   MtdGeometry g;
-  if (!node.Open(p.path, false)) throw Failure(what + ": cannot open " + p.path + ": " + ErrorText(node.Error()));
-  if (!node.GetGeometry(&g) || g.eraseSize == 0)
-    throw Failure(what + ": " + p.path + " tells no geometry (MEMGETINFO): " + ErrorText(node.Error()));
+  OpenPartitionNode(p, what, true, &node, &g);
   const unsigned long page = std::max<unsigned long>(g.pageSize, 1), block = g.eraseSize;
   if (args.oob && g.oobSize == 0)
     throw UsageError(what + ": --oob: " + p.path + " (" + stbplat::mtdio::MtdTypeName(g.type) + ") has no OOB bytes");
