@@ -131,6 +131,7 @@ const Row kRows[] = {
      "  page          2048 bytes\n  OOB           64 bytes a page\n  bad blocks    2: 2 (at 0x40000), 5 (at 0xA0000)\n"
      "  ECC           0 corrected, 0 failed; 2 bad, 0 bad-block-table blocks\n  writable      yes\n"},
     {{"--root", "@/device", "flash", "read", "--mtd", "nand0.kernel.a", "-n", "4", "-o", "-"}, 0, kExactOut, "VERS"},
+    {{"--root", "@/device", "mtd", "info", "/dev/mtd6"}, 0, kOut, "  bad blocks    1: 0 (at 0x0)\n"},
     // ROOTFS.A starts on a bad block: the record comes from the next one.
     {{"--root", "@/device", "record", "show", "NAND0.ROOTFS.A"}, 0, kOut, "root file system 2026.11b"},
     {{"--root", "@/device", "record", "show", "EMMC0.APPS.B"}, 0, kOut, "applications 1.3c"},
@@ -172,6 +173,12 @@ const Row kRows[] = {
       "--slot", "EMMC0.APPS.A=512K"}, 0, kErr, "made @/made"},
     {{"--root", "@/made", "flash", "write", "EMMC0.APPS.A+0x100", "@/dump.bin", "--verify", "--yes"}, 0, kErr,
      "wrote 19 bytes to EMMC0.APPS.A+0x100, verified"},
+    {{"root", "make", "@/two", "--nor", "256K,64K,0xE1000000", "--slot", "NOR0.BOOT.A=64K", "--slot",
+      "NOR0.PANEL.A=128K"}, 0, kErr, "made @/two"},
+    {{"LC_ALL=C", "--root", "@/two", "map"}, 0, kOut, "NOR0  SPI_NOR 256 KiB at 0xE1000000, 64 KiB sectors  "
+     "[/dev/mtd2]\n        0x0             0x10000\n"},
+    {{"root", "make", "@/no", "--proc-mtd", "@/box-mtd", "--dump", "mtd0=x,2048"}, 2, kErr,
+     "--dump mtd0=x,2048: expected NODE=FILE or NODE=FILE,PAGE,OOB"},
     {{"root", "make", "@/odd", "--emmc", "1M", "--slot", "EMMC0.APPS.A=1000"}, 2, kErr,
      "the size must be whole 0x800-byte eMMC write units"},
     {{"root", "make", "@/box", "--proc-mtd", "@/box-mtd", "--dump", "mtd0=@/device/dev/mtd7,2048,64", "--window",
@@ -207,6 +214,10 @@ const Row kRows[] = {
      "0x20000)\n"},
     {{"--root", "@/device", "flash", "erase", "--mtd", "flash1", "--yes"}, 0, kExactErr,
      "erased 6 blocks of flash1 (/dev/mtd7, 0x0 to 0x100000); skipped bad blocks 2 (at 0x40000), 5 (at 0xA0000)\n"},
+    {{"--root", "@/device", "flash", "erase", "--mtd", "mtd5+0x60000", "-n", "0x40000", "--yes"}, 2, kErr,
+     "0x60000 +0x40000 runs past the end of /dev/mtd5 (0x80000 bytes)"},
+    {{"--root", "@/device", "flash", "write", "--raw", "--pad", "--mtd", "mtd5+0x20800", "@/dump.bin", "--yes"}, 2,
+     kErr, "0x20800 lies inside bad block 1"},
     {{"--root", "@/device", "flash", "write", "--raw", "--mtd", "mtd7+0x40000", "@/dump.bin", "--yes"}, 2, kErr,
      "(19 bytes) is not whole 0x800-byte pages; pass --pad"},
     {{"--root", "@/device", "flash", "write", "--raw", "--pad", "--mtd", "mtd7+0x40000", "@/dump.bin", "--yes"}, 0,
