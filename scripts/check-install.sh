@@ -38,4 +38,7 @@ cmake --build "$work/example-build" >/dev/null
 # shellcheck disable=SC2046
 g++ -std=c++17 "$src/examples/read-version/main.cpp" -o "$work/read-version" $(pkg-config --cflags --libs stbplat)
 "$work/read-version" 2>/dev/null && { echo "check-install: read-version without arguments succeeded" >&2; exit 1; }
+# A user's program runs on the example device through the installed preload library.
+version=$("$prefix/bin/stbplat" --root "$src/examples/device" run -- "$work/read-version" NAND0 KERNEL A)
+[ "$version" = 5.15a ] || { echo "check-install: stbplat run of read-version gave '$version'" >&2; exit 1; }
 echo "check-install: the installed tool ran; find_package and pkg-config consumers built and ran"

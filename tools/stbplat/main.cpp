@@ -58,6 +58,7 @@ int Run(int argc, char** argv) {
   RegisterDiskCommands(app);
   RegisterUtilCommands(app);
   RegisterRootCommands(app);
+  RegisterRunCommand(app);
 
   try {
     app.parse(argc, argv);

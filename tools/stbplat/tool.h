@@ -50,6 +50,7 @@ void RegisterDiskCommands(CLI::App& app);
 void RegisterChecksumCommands(CLI::App& app);
 void RegisterUtilCommands(CLI::App& app);
 void RegisterRootCommands(CLI::App& app);
+void RegisterRunCommand(CLI::App& app);
 
 }  // namespace stbtool
 
