@@ -168,6 +168,8 @@ const Row kRows[] = {
      "0xE0000100 +0x10000 is not whole 0x10000-byte sectors (the sector holding it starts at 0xE0000000)"},
     {{"--root", "@/device", "flash", "erase", "0xE0020000", "--length", "0x20000", "--yes"}, 2, kErr,
      "runs past the end of its partition (0x10000 bytes left)"},
+    {{"--root", "@/device", "flash", "erase-sector", "0xE0000100", "--yes"}, 2, kErr,
+     "0xE0000100 +0x10000 is not whole 0x10000-byte sectors"},
     {{"--root", "@/device", "flash", "erase-sector", "EMMC0.APPS.B", "--yes"}, 2, kErr, "no erase sectors"},
     // eMMC slots are written through their own rows, at the offset in the slot.
     {{"--root", "@/device", "flash", "write", "EMMC0.APPS.B+0x7F010", "@/dump.bin", "--verify", "--yes"}, 0, kErr,
