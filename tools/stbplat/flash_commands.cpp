@@ -23,6 +23,7 @@
 
 #include "actions.h"
 #include "bad_blocks.h"
+#include "command_file.h"
 #include "device_table.h"
 #include "emmc_slot.h"
 #include "location_arg.h"
@@ -330,69 +331,6 @@ class TargetStream {
   bool nandByLocation_ = false;
   unsigned long norAddress_ = 0;
   unsigned long done_ = 0;
-};
-
-// A file given on the command line, "-" being standard input or output.
-class CommandFile {
- public:
-  CommandFile(const std::string& path, bool writing) : path_(path) {
-    if (path == "-") {
-      file_ = writing ? stdout : stdin;
-      return;
-    }
-    file_ = std::fopen(path.c_str(), writing ? "wb" : "rb");
-    if (file_ == nullptr) throw Failure(path + ": " + std::strerror(errno));
-    owned_ = true;
-  }
-  ~CommandFile() {
-    if (owned_) std::fclose(file_);
-  }
-  CommandFile(const CommandFile&) = delete;
-  CommandFile& operator=(const CommandFile&) = delete;
-
-  bool IsStream() const { return !owned_; }
-  // Takes the stream into a temporary file, at most `limit` bytes, and reads
-  // from there; the file's size then tells whether more was there.
-  void Spool(unsigned long limit) {
-    FILE* spool = std::tmpfile();
-    if (spool == nullptr) throw Failure(path_ + ": no temporary file: " + std::strerror(errno));
-    std::vector<unsigned char> piece(std::min(kPiece, limit));
-    for (unsigned long done = 0, got; done < limit && (got = Read(piece.data(), std::min(kPiece, limit - done))) > 0;
-         done += got)
-      if (std::fwrite(piece.data(), 1, got, spool) != got)
-        throw Failure(path_ + ": temporary file: " + std::strerror(errno));
-    std::rewind(spool);
-    file_ = spool;
-    owned_ = true;
-  }
-  // Size of a regular file; false for standard input and pipes.
-  bool Size(unsigned long* size) const {
-    struct stat info;
-    if (!owned_ || fstat(fileno(file_), &info) != 0 || !S_ISREG(info.st_mode)) return false;
-    *size = static_cast<unsigned long>(info.st_size);
-    return true;
-  }
-  // Fills up to n bytes; fewer only at the end of the input.
-  unsigned long Read(unsigned char* data, unsigned long n) {
-    unsigned long got = std::fread(data, 1, n, file_);
-    if (got < n && std::ferror(file_)) throw Failure(path_ + ": " + std::strerror(errno));
-    return got;
-  }
-  void Write(const unsigned char* data, unsigned long n) {
-    if (std::fwrite(data, 1, n, file_) != n) throw Failure(path_ + ": write failed: " + std::strerror(errno));
-  }
-  void Rewind() { std::rewind(file_); }
-  void Close() {
-    bool failed = std::fflush(file_) != 0;
-    if (owned_) failed = std::fclose(file_) != 0 || failed;
-    owned_ = false;
-    if (failed) throw Failure(path_ + ": write failed: " + std::strerror(errno));
-  }
-
- private:
-  std::string path_;
-  FILE* file_ = nullptr;
-  bool owned_ = false;
 };
 
 // Index of the first byte that differs, or n.

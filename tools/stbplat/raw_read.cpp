@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "bad_blocks.h"
+#include "command_file.h"
 #include "mtd_partition_arg.h"
 #include "mtdio/mtd_node.h"
 #include "output.h"
@@ -30,40 +31,6 @@ const char kCommand[] = "flash read";
 constexpr unsigned char kPadByte = 0xFF;
 
 std::string ErrorText(int error) { return std::strerror(error); }
-
-// The output file, or standard output for "-"; closed by the destructor
-// when Close was not reached.
-class OutputFile {
- public:
-  explicit OutputFile(const std::string& path) : path_(path) {
-    if (path == "-") {
-      file_ = stdout;
-      return;
-    }
-    file_ = std::fopen(path.c_str(), "wb");
-    if (file_ == nullptr) throw Failure(path + ": " + ErrorText(errno));
-    owned_ = true;
-  }
-  ~OutputFile() {
-    if (owned_) std::fclose(file_);
-  }
-  OutputFile(const OutputFile&) = delete;
-  OutputFile& operator=(const OutputFile&) = delete;
-  void Write(const unsigned char* data, unsigned long n) {
-    if (std::fwrite(data, 1, n, file_) != n) throw Failure(path_ + ": write failed: " + ErrorText(errno));
-  }
-  void Close() {
-    bool failed = std::fflush(file_) != 0;
-    if (owned_) failed = std::fclose(file_) != 0 || failed;
-    owned_ = false;
-    if (failed) throw Failure(path_ + ": write failed: " + ErrorText(errno));
-  }
-
- private:
-  std::string path_;
-  FILE* file_ = nullptr;
-  bool owned_ = false;
-};
 
 // The bad blocks from the block holding `from` to the end, asked of the
 // node block by block before anything is read.
@@ -126,7 +93,7 @@ void RunRawRead(const MtdPartition& p, const RawReadArgs& args) {
   if (args.output == "-" && isatty(STDOUT_FILENO))
     throw UsageError(std::string(kCommand) + ": give -o FILE (standard output is a terminal)");
 
-  OutputFile out(args.output);
+  CommandFile out(args.output, true);
   std::vector<unsigned char> data(block), oob(args.oob ? block / page * g.oobSize : 0);
   std::vector<unsigned long> met, eccFailed;
   EccCounts before;
