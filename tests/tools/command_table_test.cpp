@@ -37,6 +37,13 @@ const std::string kUnknownEntries = std::string("FSBL\0\0\x01\xB2\0\0\0\0VERS\0\
 // A package header whose device name is not UTF-8.
 const std::string kBadName = std::string("\0\0PKGHN\xFF\x80" "D0...KERNEL..A.......", 30) + std::string(12, '\0');
 
+// n cells of the map's horizontal line.
+std::string Bar(int n) {
+  std::string bar;
+  for (int i = 0; i < n; ++i) bar += "─";
+  return bar;
+}
+
 enum Where { kOut, kErr, kExactOut, kExactErr };
 
 struct Row {
@@ -183,8 +190,13 @@ const Row kRows[] = {
      "wrote 19 bytes to EMMC0.APPS.A+0x100, verified"},
     {{"root", "make", "@/two", "--nor", "256K,64K,0xE1000000", "--slot", "NOR0.BOOT.A=64K", "--slot",
       "NOR0.PANEL.A=128K"}, 0, kErr, "made @/two"},
-    {{"LC_ALL=C", "--root", "@/two", "map"}, 0, kOut, "NOR0  SPI_NOR 256 KiB at 0xE1000000, 64 KiB sectors  "
-     "[/dev/mtd2]\n        0x0             0x10000\n"},
+    {{"LC_ALL=C.UTF-8", "--root", "@/two", "map"}, 0, kExactOut,
+     "NOR0  SPI_NOR 256 KiB at 0xE1000000, 64 KiB sectors  [/dev/mtd2]\n        0x0             0x10000\n"
+     "        ┌" + Bar(15) + "┬" + Bar(31) + "┬" + Bar(15) + "┐\n"
+     "  part  │BOOT           │PANEL" + std::string(26, ' ') + "│" + std::string(15, ' ') + "│\n"
+     "        ├" + Bar(15) + "┼" + Bar(31) + "┼" + Bar(15) + "┤\n"
+     "  slots │A 64K mtd0     │A 128K mtd1" + std::string(20, ' ') + "│" + std::string(15, ' ') + "│\n"
+     "        └" + Bar(15) + "┴" + Bar(31) + "┴" + Bar(15) + "┘\n\n"},
     {{"root", "make", "@/no", "--proc-mtd", "@/box-mtd", "--dump", "mtd0=x,2048"}, 2, kErr,
      "--dump mtd0=x,2048: expected NODE=FILE or NODE=FILE,PAGE,OOB"},
     {{"root", "make", "@/no", "--nand", "1000K,2048,64,128K", "--slot", "NAND0.A.A=128K"}, 2, kErr,
