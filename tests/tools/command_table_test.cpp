@@ -92,6 +92,9 @@ const Row kRows[] = {
     {{"--root", "@/device", "record", "show", "NOR0.BOOT.A", "--at", "0x10"}, 1, kErr,
      "0x16 (package/packageHeaderLocation/deviceName): type code '??DA' (0x00004441) is no known record"},
     {{"record", "show", "-"}, 0, kErr, "FSBL info\nstbplat: library: last message repeated 49 times\n", kUnknownEntries},
+    // A library message holding zero bytes shows them escaped, on its own line.
+    {{"record", "show", "--type", "vers", "-"}, 1, kErr, "found \\x00\\x00AB instead\nstbplat: record show: -:",
+     std::string("\0\0AB\0\0\0\x10", 8) + std::string(16, 'a')},
     {{"--json", "record", "show", "-"}, 1, kErr, "deviceName holds the byte 0xFF at 1", kBadName},
     {{"--json", "record", "show", "--type", "package", "-"}, 0, kOut, "\"N\\\\xFF\\\\x80D0.KERNEL.A\"", kBadName},
     {{"--json", "ini", "@/latin1.ini"}, 0, kOut, "\"name\": \"caf\\\\xE9\""},
