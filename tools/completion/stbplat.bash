@@ -9,6 +9,14 @@ _stbplat() {
     case ${COMP_WORDS[i]} in
       --root | -o | --output | --at | --type | -n | -s | --length | --offset | --indent | \
         --nand | --nor | --emmc | --slot | --proc-mtd | --dump | --window | --memory-map | --bb) ((i++)) ;;
+      --)
+        # What follows `run --` is the user's program and its arguments, not
+        # the tool's: a command name first, then files.
+        if ((${#words[@]} > 0)) && [[ ${words[-1]} == run ]]; then
+          ((i == COMP_CWORD - 1)) && COMPREPLY=($(compgen -c -- "$cur"))
+          COMPREPLY+=($(compgen -f -- "$cur"))
+          return
+        fi ;;
       -*) ;;
       *) words+=("${COMP_WORDS[i]}") ;;
     esac
