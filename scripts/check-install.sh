@@ -10,8 +10,9 @@ trap 'rm -rf "$work"' EXIT
 prefix=$work/prefix
 cmake --install "$build" --prefix "$prefix" >/dev/null
 consumer=$src/tests/install/consumer
-# Nothing below may lean on the loader's search path.
-unset LD_LIBRARY_PATH
+# Nothing below may lean on the loader's search path, nor find the device or
+# the preload library by the environment.
+unset LD_LIBRARY_PATH STBPLAT_ROOT STBPLAT_MEMORY_MAP STBPLAT_HOSTSIM_LIBRARY
 "$prefix/bin/stbplat" --help >/dev/null
 "$prefix/bin/stbplat" --root "$src/examples/device" record show NOR0.BOOT.A >/dev/null
 # The manual and the completion come with it, and name every command group.
@@ -41,4 +42,12 @@ g++ -std=c++17 "$src/examples/read-version/main.cpp" -o "$work/read-version" $(p
 # A user's program runs on the example device through the installed preload library.
 version=$("$prefix/bin/stbplat" --root "$src/examples/device" run -- "$work/read-version" NAND0 KERNEL A)
 [ "$version" = 5.15a ] || { echo "check-install: stbplat run of read-version gave '$version'" >&2; exit 1; }
+# One that rewrites a record changes a copy of it, and a second run reads what the first stored.
+# shellcheck disable=SC2046
+g++ -std=c++17 "$src/examples/rewrite-version/main.cpp" -o "$work/rewrite-version" $(pkg-config --cflags --libs stbplat)
+cp -r "$src/examples/device" "$work/device"
+for expected in "5.15a -> 5.16a" "5.16a -> 5.17a"; do
+  got=$("$prefix/bin/stbplat" --root "$work/device" run -- "$work/rewrite-version" NAND0 KERNEL A)
+  [ "$got" = "$expected" ] || { echo "check-install: stbplat run of rewrite-version gave '$got', not '$expected'" >&2; exit 1; }
+done
 echo "check-install: the installed tool ran; find_package and pkg-config consumers built and ran"
