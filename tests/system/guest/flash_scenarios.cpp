@@ -293,6 +293,7 @@ SCENARIO("flash.emmc") {
 // timings are never asserted. Leaves the partition erased.
 static void TimeSlot(const char* slot, const std::string& node, unsigned long length) {
   const char* path = "/tmp/timing.in";
+  struct Remove { const char* path; ~Remove() { ::unlink(path); } } remove{path};  // whatever check stops it
   int fd = ::open(path, O_RDWR | O_CREAT | O_TRUNC, 0600);
   REQUIRE(fd >= 0 && ::ftruncate(fd, length) == 0);
   void* map = ::mmap(nullptr, length, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
@@ -312,7 +313,6 @@ static void TimeSlot(const char* slot, const std::string& node, unsigned long le
   double toolWrite = Seconds([&] { CHECK(Shell("nandwrite -q -p " + node + " " + path)); });
   std::string dump = "nanddump -q --bb=skipbad -f /dev/null -l " + std::to_string(length) + " " + node;
   double toolRead = Seconds([&] { CHECK(Shell(dump)); });
-  ::unlink(path);
   CHECK(FlashErase(node));
   auto rate = [&](double seconds) { return length / 1048576.0 / seconds; };
   std::ostringstream line;
@@ -327,8 +327,8 @@ static void TimeSlot(const char* slot, const std::string& node, unsigned long le
 SCENARIO("flash.timing") { TimeSlot("NAND0.ROOTFS.A", "/dev/mtd11", 63 * kBlock); }
 
 // The whole of USER.A, 1920 blocks (240 MiB), none bad: every block's lookup
-// walks the bad-block table from block 0, so the library's time grows with
-// the square of the partition's size.
+// walks the bad-block table from block 0, so the lookups grow with the
+// square of the partition's size.
 SCENARIO("flash.timing_whole_user") { TimeSlot("NAND0.USER.A", "/dev/mtd13", 1920 * kBlock); }
 
 SCENARIO("flash.erase_slots") {
