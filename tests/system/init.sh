@@ -167,10 +167,11 @@ nand_load badblocks=$BAD_AT_LOAD || fail setup "NAND simulator"
 cat /proc/mtd
 
 # ---- Scenarios --------------------------------------------------------------------
-# run_guest <name>: one scenario of the guest program, in its own process.
+# run_guest <name> [seconds]: one scenario of the guest program, in its own
+# process, killed after the seconds given (default 120).
 run_guest() {
   want "$1" || return 0
-  timeout 120 "$GUEST" "$1"
+  timeout "${2:-120}" "$GUEST" "$1"
   rc=$?
   [ $rc -gt 1 ] && fail "$1" "guest program exited with status $rc"
   return 0
