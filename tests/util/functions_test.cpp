@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "stbplat/display_utils.h"
@@ -39,8 +40,7 @@ TEST(DumpBuffer, IndentClampedNoBytesAndTheLevelGate) {
   const std::string clamped = std::string(103, ' ') + "AB " + std::string(50, ' ') + ".";
   EXPECT_EQ(capture.texts(), (std::vector<std::string>{clamped + std::string(15, ' ') + "\r\n",
                                                        "<none>\r\n", "<none>\r\n"}));
-  EXPECT_EQ(capture.messages()[0].level, 4u);
-  EXPECT_EQ(capture.messages()[0].function, "DumpBuffer");
+  EXPECT_EQ(std::tie(capture.messages()[0].level, capture.messages()[0].function), std::make_tuple(4u, "DumpBuffer"));
   capture.Clear();
   capture.SetLevel(eLogModuleRecords, 3);
   DumpBuffer(eLogModuleRecords, 0, &byte, 1);
@@ -76,10 +76,8 @@ TEST(SubsystemInit, ZanForwardsToThePlatformHWSpecificLogsATrace) {
   EXPECT_EQ(HWSpecificInit(), 0);
   EXPECT_EQ(capture.texts(), std::vector<std::string>{"HW Specific Init\n"});
   const stbplat::test::LogMessage& m = capture.messages().at(0);
-  EXPECT_EQ(m.module, 11);
-  EXPECT_EQ(m.level, 6u);
-  EXPECT_EQ(m.sourceFile, "HWSpecific");
-  EXPECT_EQ(m.function, "HWSpecificInit");
+  EXPECT_EQ(std::tie(m.module, m.level, m.sourceFile, m.function),
+            std::make_tuple(11, 6u, "HWSpecific", "HWSpecificInit"));
 }
 
 }  // namespace
