@@ -159,8 +159,8 @@ TEST(HardDriveProbeNodePosition, ListReadInPiecesHostNumbersAndMessages) {
   EXPECT_EQ(log.texts(), (Texts{sata + "Failed To Open /proc/scsi/scsi\n\r",
                                 kError + "HardDriveScanDeviceNode] Hard Drive Not Found\n\r",
                                 sata + "No Scsi Device Attached\n\r"}));
-  const stbplat::test::LogMessage& first = log.messages().at(0);
-  EXPECT_EQ(std::make_tuple(first.module, first.level, first.sourceFile), std::make_tuple(18, 6u, "HardDriveTempUtils"));
+  const stbplat::test::LogMessage& m = log.messages().at(0);
+  EXPECT_EQ(std::make_tuple(m.module, m.level, m.sourceFile), std::make_tuple(18, 6u, "HardDriveTempUtils"));
 }
 
 TEST(HardDriveProbeScsiBusPosition, NotFoundFailedRequestsAndMissingArguments) {
@@ -182,7 +182,8 @@ TEST(HardDriveProbeScsiBusPosition, NotFoundFailedRequestsAndMissingArguments) {
   EXPECT_EQ(HardDriveProbeScsiBusPosition(3, nullptr) + HardDriveProbeNodePosition(nullptr) +
                 HardDriveScanDeviceNode(nullptr) + HardDriveProbeSataPosition(nullptr) +
                 HardDriveGetVendorType(nullptr, &found) + HardDriveGetVendorType(&drive, nullptr) +
-                HardDriveGetTemperatureData(nullptr, 10, nullptr) + HardDriveGetTemperatureData(&drive, 10, nullptr), 0);
+                HardDriveGetTemperatureData(nullptr, 10, nullptr) + HardDriveGetTemperatureData(&drive, 10, nullptr),
+            0);
   EXPECT_FALSE(GetHdTemperature(nullptr) || HardDriveGetTemperature(nullptr, &found) ||
                HardDriveGetTemperature(&drive, nullptr));
 }
