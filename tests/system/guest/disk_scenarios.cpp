@@ -116,22 +116,22 @@ SCENARIO("disk.temperature") {
 }
 
 // The diagnostic loop never returns once it has a disk: its first round,
-// run in a child, and "looping" or "returned".
+// run in a child, and "looping" or "returned" and the value.
 static std::string SmartLoopRound() {
   pid_t done = -1;
+  int status = 0;
   std::string text = CaptureStdout([&] {
     pid_t child = fork();
     if (child == 0) {
       std::setvbuf(stdout, nullptr, _IONBF, 0);
-      GetHDDTemperature();
-      _exit(2);
+      _exit(GetHDDTemperature() & 0xFF);
     }
     sleep(3);
-    done = waitpid(child, nullptr, WNOHANG);  // 0: still looping
+    done = waitpid(child, &status, WNOHANG);  // 0: still looping
     if (child > 0) kill(child, SIGKILL);
     waitpid(child, nullptr, 0);
   });
-  return text + (done == 0 ? "looping" : "returned");
+  return text + (done == 0 ? "looping" : "returned " + std::to_string(static_cast<signed char>(WEXITSTATUS(status))));
 }
 
 // The loop passes the stick over for sdb. The emulated disk answers SMART
@@ -226,7 +226,7 @@ SCENARIO("disk.usb_empty_slot") {
   REQUIRE(ProvideScsiList());
   Info("empty card-reader slot on " + slot + ", the disk on sdb");
   CHECK_EQ(Probe(), DiskReading());
-  // The disk taken away, then back through a rescan of its host.
+  // The disk taken away, then the slot, then the disk back through a rescan of its host.
   std::string link = ShellOutput("readlink /sys/class/block/sdb");
   std::string host = link.substr(link.find("/host") + 1);
   host = host.substr(0, host.find('/'));
@@ -242,8 +242,12 @@ SCENARIO("disk.usb_empty_slot") {
   // cannot be read, counts (compared unsigned) as a large USB disk's; the
   // loop's own open does not wait for a medium, so it polls the empty slot.
   const std::string onSda = "Device /dev/sda open failed \nExt USB HDD detected \nHDIO_DRIVE_CMD failed\nlooping";
-  CHECK_EQ(SmartLoopRound(), slot == "sda" ? onSda : "ATA HDD not found \nreturned");
+  CHECK_EQ(SmartLoopRound(), slot == "sda" ? onSda : "ATA HDD not found \nreturned -1");
+  // The slot deleted as well (for good: no scenario after this one needs it), the loop finds nothing.
+  CHECK(Shell("echo 1 >/sys/block/" + slot + "/device/delete"));
+  CHECK_EQ(SmartLoopRound(), "ATA HDD not found \nreturned -1");
+  // The disk comes back on the lowest free letter.
   CHECK(Shell("echo '- - -' >/sys/class/scsi_host/" + host + "/scan"));
-  CHECK(Shell("for _ in $(seq 1 50); do [ -e /dev/sdb ] && exit 0; sleep 0.2; done; exit 1"));
-  CHECK(LinkHas("sdb", "/ata"));
+  CHECK(Shell("for _ in $(seq 1 50); do [ -e /dev/sda ] && exit 0; sleep 0.2; done; exit 1"));
+  CHECK(LinkHas("sda", "/ata"));
 }
